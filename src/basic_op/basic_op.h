@@ -1,0 +1,197 @@
+// Saturating 16/32-bit fixed-point operators: the arithmetic every codec stage
+// is written in.  Each operator is a constexpr inline function here; the
+// exported vamrnb_* functions (basic_op.cpp) are thin faces over these same
+// definitions, so inline and called forms cannot drift apart.
+//
+// No operator relies on signed overflow.  Where a result is meant to wrap, it
+// goes through wrap_add / wrap_sub / wrap_mul (two's-complement on uint32_t);
+// where it saturates, through sat16 / sat32.
+#pragma once
+
+#include <cstdint>
+#include <type_traits>
+
+namespace vamrnb {
+
+using Word16 = int16_t;
+using Word32 = int32_t;
+
+inline constexpr Word32 MAX_32 = 0x7fffffff;
+inline constexpr Word32 MIN_32 = static_cast<Word32>(0x80000000u);
+inline constexpr Word16 MAX_16 = 0x7fff;
+inline constexpr Word16 MIN_16 = -0x8000;
+
+// ---- explicit wrap-around and saturation helpers --------------------------
+
+constexpr Word32 wrap_add(Word32 a, Word32 b) {
+    return static_cast<Word32>(static_cast<uint32_t>(a) + static_cast<uint32_t>(b));
+}
+constexpr Word32 wrap_sub(Word32 a, Word32 b) {
+    return static_cast<Word32>(static_cast<uint32_t>(a) - static_cast<uint32_t>(b));
+}
+constexpr Word32 wrap_mul(Word32 a, Word32 b) {
+    return static_cast<Word32>(static_cast<uint32_t>(a) * static_cast<uint32_t>(b));
+}
+// Left shift that keeps the low 32 bits (what "<<" does on hardware).
+constexpr Word32 wrap_shl(Word32 a, int n) {
+    return static_cast<Word32>(static_cast<uint32_t>(a) << n);
+}
+// Low 16 bits, sign-extended.
+constexpr Word16 wrap16(Word32 a) { return static_cast<Word16>(a); }
+
+constexpr Word16 sat16(int64_t v) {
+    return v > MAX_16 ? MAX_16 : v < MIN_16 ? MIN_16 : static_cast<Word16>(v);
+}
+constexpr Word32 sat32(int64_t v) {
+    return v > MAX_32 ? MAX_32 : v < MIN_32 ? MIN_32 : static_cast<Word32>(v);
+}
+
+// ---- 16-bit operators ------------------------------------------------------
+
+constexpr Word16 saturate(Word32 L) { return sat16(L); }
+constexpr Word16 add(Word32 a, Word32 b) { return sat16(int64_t{a} + b); }
+constexpr Word16 sub(Word32 a, Word32 b) { return sat16(int64_t{a} - b); }
+
+constexpr Word16 abs_s(Word16 a) {
+    return a == MIN_16 ? MAX_16 : static_cast<Word16>(a < 0 ? -a : a);
+}
+constexpr Word16 negate(Word16 a) {
+    return a == MIN_16 ? MAX_16 : static_cast<Word16>(-a);
+}
+
+constexpr Word16 shr(Word16 a, Word32 n);
+
+constexpr Word16 shl(Word16 a, Word32 n) {
+    if (n < 0) return shr(a, n < -16 ? 16 : -n);
+    if (a == 0) return 0;
+    if (n > 15) return a > 0 ? MAX_16 : MIN_16;
+    const Word32 r = static_cast<Word32>(a) * (Word32{1} << n);
+    return sat16(r);
+}
+
+constexpr Word16 shr(Word16 a, Word32 n) {
+    if (n < 0) return shl(a, n < -16 ? 16 : -n);
+    if (n >= 15) return a < 0 ? -1 : 0;
+    return static_cast<Word16>(a >> n);
+}
+
+constexpr Word16 mult(Word16 a, Word16 b) {
+    return sat16((Word32{a} * b) >> 15);
+}
+constexpr Word16 mult_r(Word16 a, Word16 b) {
+    return sat16((Word32{a} * b + 0x4000) >> 15);
+}
+
+constexpr Word16 extract_h(Word32 L) { return static_cast<Word16>(L >> 16); }
+constexpr Word16 extract_l(Word32 L) { return wrap16(L); }
+
+// ---- 32-bit operators ------------------------------------------------------
+
+constexpr Word32 l_mult(Word16 a, Word16 b) {
+    const Word32 p = Word32{a} * b;
+    return p == 0x40000000 ? MAX_32 : p * 2;
+}
+constexpr Word32 l_add(Word32 a, Word32 b) { return sat32(int64_t{a} + b); }
+constexpr Word32 l_sub(Word32 a, Word32 b) { return sat32(int64_t{a} - b); }
+constexpr Word32 l_mac(Word32 acc, Word16 a, Word16 b) { return l_add(acc, l_mult(a, b)); }
+constexpr Word32 l_msu(Word32 acc, Word16 a, Word16 b) { return l_sub(acc, l_mult(a, b)); }
+constexpr Word32 l_negate(Word32 L) { return L == MIN_32 ? MAX_32 : -L; }
+constexpr Word32 l_abs(Word32 L) { return L == MIN_32 ? MAX_32 : (L < 0 ? -L : L); }
+constexpr Word32 l_deposit_h(Word16 a) { return wrap_shl(a, 16); }
+constexpr Word32 l_deposit_l(Word16 a) { return a; }
+
+// Rounds a Word32 to its upper half (the standard's "round").
+constexpr Word16 round16(Word32 L) { return extract_h(l_add(L, 0x8000)); }
+constexpr Word16 mac_r(Word32 acc, Word16 a, Word16 b) { return round16(l_mac(acc, a, b)); }
+constexpr Word16 msu_r(Word32 acc, Word16 a, Word16 b) { return round16(l_msu(acc, a, b)); }
+
+constexpr Word32 l_shl(Word32 L, Word32 n) {
+    if (n <= 0) {
+        const Word32 s = -static_cast<int64_t>(n) > 31 ? 31 : -n;
+        return L >> s;
+    }
+    for (; n > 0; --n) {
+        if (L > 0x3fffffff) return MAX_32;
+        if (L < -0x40000000) return MIN_32;
+        L *= 2;
+    }
+    return L;
+}
+
+constexpr Word32 l_shr(Word32 L, Word32 n) {
+    if (n < 0) return l_shl(L, n < -32 ? 32 : -n);
+    return L >> (n > 31 ? 31 : n);
+}
+
+constexpr Word16 shr_r(Word16 a, Word32 n) {
+    if (n > 15) return 0;
+    Word16 r = shr(a, n);
+    if (n > 0 && (a & (1 << (n - 1)))) ++r;
+    return r;
+}
+
+constexpr Word32 l_shr_r(Word32 L, Word32 n) {
+    if (n > 31) return 0;
+    Word32 r = l_shr(L, n);
+    if (n > 0 && ((static_cast<uint32_t>(L) >> (n - 1)) & 1u)) ++r;
+    return r;
+}
+
+constexpr Word16 norm_s(Word16 a) {
+    if (a == 0) return 0;
+    if (a == -1) return 15;
+    Word32 v = a < 0 ? ~Word32{a} : Word32{a};
+    Word16 n = 0;
+    while (v < 0x4000) { v <<= 1; ++n; }
+    return n;
+}
+
+constexpr Word16 norm_l(Word32 L) {
+    if (L == 0) return 0;
+    if (L == -1) return 31;
+    uint32_t v = static_cast<uint32_t>(L < 0 ? ~L : L);
+    Word16 n = 0;
+    while (v < 0x40000000u) { v <<= 1; ++n; }
+    return n;
+}
+
+// Prints the standard's diagnostics for invalid div_s arguments (never inline).
+void div_s_report(Word32 num, Word32 den);
+
+constexpr Word16 div_s(Word32 num, Word32 den) {
+    if (num > den || num < 0 || den <= 0) {
+        if (!std::is_constant_evaluated()) div_s_report(num, den);
+    }
+    if (num == 0) return 0;
+    if (num == den) return MAX_16;
+    Word32 r = num;
+    Word32 q = 0;
+    for (int i = 0; i < 15; ++i) {
+        r = wrap_add(r, r);
+        q = wrap_add(q, q);
+        if (r >= den) {
+            r = wrap_sub(r, den);
+            q = wrap_add(q, 1);
+        }
+    }
+    return wrap16(q);
+}
+
+// ---- double-precision pairs (hi, lo): value = hi·2^16 + lo·2 --------------
+
+constexpr void l_extract(Word32 L, Word16 *hi, Word16 *lo) {
+    *hi = extract_h(L);
+    *lo = extract_l(l_msu(L >> 1, *hi, 16384));
+}
+constexpr Word32 l_comp(Word16 hi, Word16 lo) { return l_mac(l_deposit_h(hi), lo, 1); }
+
+constexpr Word32 mpy_32(Word16 hi1, Word16 lo1, Word16 hi2, Word16 lo2) {
+    Word32 L = l_mult(hi1, hi2);
+    L = l_mac(L, mult(hi1, lo2), 1);
+    return l_mac(L, mult(lo1, hi2), 1);
+}
+constexpr Word32 mpy_32_16(Word16 hi, Word16 lo, Word16 n) {
+    return l_mac(l_mult(hi, n), mult(lo, n), 1);
+}
+
+}  // namespace vamrnb
