@@ -1,0 +1,13 @@
+#!/usr/bin/env bash
+# Builds everything in build/ and runs every registered test: unit tests,
+# public-header, export and installation checks, and the conformance runs
+# that are switched on (VAMRNB_CONFORMANCE_DEC / _ENC / _DTX).
+# Extra arguments are passed to the CMake configure step.
+set -euo pipefail
+cd "$(dirname "$0")/.."
+source scripts/setup-deps.sh
+vamrnb_setup_deps
+
+cmake -S . -B build -DCMAKE_BUILD_TYPE=Release -DVAMRNB_BUILD_TESTS=ON "$@"
+cmake --build build -j2
+ctest --test-dir build --output-on-failure -j2
