@@ -110,6 +110,9 @@ constexpr Word32 l_shl(Word32 L, Word32 n) {
         const Word32 s = -static_cast<int64_t>(n) > 31 ? 31 : -n;
         return L >> s;
     }
+    // Any non-zero value saturates within 31 doublings; zero stays zero, so
+    // the loop never has to run the full (possibly huge) count.
+    if (L == 0) return 0;
     for (; n > 0; --n) {
         if (L > 0x3fffffff) return MAX_32;
         if (L < -0x40000000) return MIN_32;
