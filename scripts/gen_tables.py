@@ -124,9 +124,13 @@ def main():
     fpdef.append("const int16_t *const homing_frame_params[8] = {\n    "
                  + ", ".join(f"dhf_{m}" for m in MODES) + ",\n};\n")
 
-    def write(group, path_h, path_cpp, purpose):
+    def write(group, path_h, path_cpp, purpose, public_header=None):
         cdecl, cdef, pdecl, pdef = out[group]
-        guard_h = (f"{banner}// {purpose}\n#pragma once\n\n#include <cstdint>\n\n"
+        # The public header declares the exported tables with default
+        # visibility; including it here gives the definitions that visibility.
+        pub = f"#include \"{public_header}\"\n" if public_header else ""
+        guard_h = (f"{banner}// {purpose}\n#pragma once\n\n#include <cstdint>\n\n{pub}"
+                   + ("\n" if pub else "") +
                    "extern \"C\" {\n" + "\n".join(cdecl) + "\n}\n\n"
                    "namespace vamrnb::tab {\n" + "\n".join(pdecl) + "\n}  // namespace vamrnb::tab\n")
         with open(os.path.join(ROOT, path_h), "w") as f:
@@ -139,7 +143,8 @@ def main():
             f.write(body)
 
     write("format", "src/format/frame_tables.h", "src/format/frame_tables.cpp",
-          "Frame-format tables: sizes, parameter widths, bit order, homing frames.")
+          "Frame-format tables: sizes, parameter widths, bit order, homing frames.",
+          public_header="vamrnb_dsp.h")
     write("lpc", "src/lpc/tables.h", "src/lpc/tables.cpp",
           "Codec constant tables: windows, codebooks, gains, filters, detector tables.")
 

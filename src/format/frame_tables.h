@@ -5,6 +5,8 @@
 
 #include <cstdint>
 
+#include "vamrnb_dsp.h"
+
 extern "C" {
 extern const int16_t vamrnb_tbl_packed_size[16];
 extern const int16_t vamrnb_tbl_prmno[10];
