@@ -10,7 +10,9 @@
 #include <cstdint>
 
 #include "vamrnb.h"
+#include "vamrnb_dsp.h"
 #include "basic_op/basic_op.h"
+#include "format/frame_format.h"
 #include "lpc/lpc.h"
 #include "enc/subframe_state.h"
 #include "vad/vad_state.h"
@@ -43,6 +45,7 @@ struct vamrnb_encoder {
     // [160..319] newest frame; shifted down by 160 after every frame.
     vamrnb::Word16 old_speech[vamrnb::ENC_SPEECH_LEN];
 
+    vcmn_bsw writer;                   // bound to the caller's output each frame
     vamrnb_encoder *self;              // own address once creation succeeded
     codec_config config;               // copy of the caller's four words;
                                        // config.enc.mode is the requested mode
@@ -50,6 +53,7 @@ struct vamrnb_encoder {
 
     vamrnb::dtx_enc_state dtx;         // DTX history and SID indices
     vamrnb::vad_area vad;              // whichever detector is configured
+    sid_sync_state sid;                // SID scheduling; sid.tx_type = this frame's TX type
     int32_t prev_tx_type;              // TX type of the previous frame (0..3)
 
     // High-pass pre-filter: last two outputs in double precision (hi, lo)
