@@ -1,0 +1,322 @@
+// Voice activity detectors: band splitting, low-power and hangover rules of
+// option 1, the option-2 transform and decisions, and the per-frame entry
+// point's option dispatch.
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <cstring>
+#include <random>
+#include <vector>
+
+#include "enc/enc_state.h"
+#include "vad/vad.h"
+
+using namespace vamrnb;
+
+namespace {
+
+constexpr double PI = 3.14159265358979323846;
+
+// A frame buffer with 40 samples of history in front of the 160 new ones, as
+// the detector reads them.
+struct frame_buf {
+    Word16 s[200] = {};
+    Word16 *fresh() { return s + 40; }
+    // Shifts the last 40 new samples to the front and fills 160 new ones.
+    template <class F> void next(F gen) {
+        std::memmove(s, s + 160, 40 * sizeof(Word16));
+        for (int i = 0; i < 160; ++i) s[40 + i] = gen();
+    }
+};
+
+struct noise_gen {
+    std::mt19937 rng;
+    std::uniform_int_distribution<int> d;
+    noise_gen(int amp, unsigned seed) : rng(seed), d(-amp, amp) {}
+    Word16 operator()() { return static_cast<Word16>(d(rng)); }
+};
+
+struct sine_gen {
+    double w, amp;
+    long n = 0;
+    sine_gen(double hz, double a) : w(2 * PI * hz / 8000.0), amp(a) {}
+    Word16 operator()() { return static_cast<Word16>(std::lround(amp * std::sin(w * n++))); }
+};
+
+int argmax_level(const vad1_state &st) {
+    int best = 0;
+    for (int i = 1; i < VAD_BANDS; ++i)
+        if (st.old_level[i] > st.old_level[best]) best = i;
+    return best;
+}
+
+}  // namespace
+
+// ---- option 1 -------------------------------------------------------------------
+
+TEST(Vad1, InitialState) {
+    vad1_state st;
+    std::memset(&st, 0x55, sizeof st);
+    vad1_init(&st);
+    for (int i = 0; i < VAD_BANDS; ++i) {
+        EXPECT_EQ(st.bckr_est[i], 150);
+        EXPECT_EQ(st.ave_level[i], 150);
+        EXPECT_EQ(st.old_level[i], 150);
+        EXPECT_EQ(st.sub_level[i], 0);
+    }
+    EXPECT_EQ(st.best_corr_hp, 13106);
+    EXPECT_EQ(st.corr_hp_fast, 13106);
+    EXPECT_EQ(st.vadreg, 0);
+    EXPECT_EQ(st.a_data5[2][1], 0);
+    EXPECT_EQ(st.a_data3[4], 0);
+}
+
+// Each band of the filter bank must collect the tone that falls into it.
+TEST(Vad1, FilterBankPutsTonesInTheirBands) {
+    const struct { double hz; int band; } cases[] = {
+        {120, 0}, {375, 1}, {625, 2}, {875, 3}, {1250, 4},
+        {1750, 5}, {2250, 6}, {2750, 7}, {3500, 8},
+    };
+    for (const auto &c : cases) {
+        vad1_state st;
+        vad1_init(&st);
+        frame_buf buf;
+        sine_gen g(c.hz, 8000);
+        for (int f = 0; f < 4; ++f) {
+            buf.next(g);
+            vad1(&st, buf.fresh());
+        }
+        EXPECT_EQ(argmax_level(st), c.band) << c.hz << " Hz";
+    }
+}
+
+// The level of a band covers the previous frame's look-ahead tail and the
+// whole current band signal; the tail is carried to the next frame.
+TEST(Vad1, LevelCalculationCarriesTheLookAhead) {
+    // Band 0 layout: step 16, start 0, samples 0..7 head, 8..9 look-ahead.
+    Word16 a[160] = {}, b[160] = {};
+    for (int i = 0; i < 10; ++i) {
+        a[16 * i] = static_cast<Word16>(i < 8 ? 1000 : -300 * i);  // tail: -2400, -2700
+        b[16 * i] = static_cast<Word16>(i < 8 ? 100 + i : 5000);
+    }
+    Word16 sub = 0;
+    vamrnbe_lev_calculation(a, 8, 10, 16, 0, 16, &sub);
+    const int tail_a = 2 * (2400 + 2700);
+    EXPECT_EQ(sub, tail_a);
+    const Word16 lev = vamrnbe_lev_calculation(b, 8, 10, 16, 0, 16, &sub);
+    int head_b = 0;
+    for (int i = 0; i < 8; ++i) head_b += 2 * (100 + i);
+    const int tail_b = 2 * 2 * 5000;
+    EXPECT_EQ(lev, tail_a + head_b + tail_b);
+    EXPECT_EQ(sub, tail_b);
+
+    // Scale 15 (the top band) halves both the carried part and the level.
+    sub = 0;
+    vamrnbe_lev_calculation(a, 8, 10, 16, 0, 15, &sub);
+    EXPECT_EQ(sub, tail_a / 2);
+    EXPECT_EQ(vamrnbe_lev_calculation(b, 8, 10, 16, 0, 15, &sub), (tail_a + head_b + tail_b) / 2);
+}
+
+// Frames below the power floor decide 0 and drop every pending hangover,
+// whatever the band SNRs say.
+TEST(Vad1, LowPowerForcesSilence) {
+    vad1_state st;
+    vad1_init(&st);
+    st.hang_count = 6;
+    st.burst_count = 3;
+    st.complex_hang_count = 200;
+    st.complex_hang_timer = 150;
+    st.vadreg = 0x7fff;
+    st.best_corr_hp = 32000;
+    frame_buf buf;
+    int k = 0;
+    buf.next([&] { return static_cast<Word16>((k++ & 1) ? 6 : -6); });  // power 11520
+    EXPECT_EQ(vad1(&st, buf.fresh()), 0);
+    EXPECT_EQ(st.hang_count, 0);
+    EXPECT_EQ(st.burst_count, 0);
+    EXPECT_EQ(st.complex_hang_count, 0);
+    EXPECT_EQ(st.complex_hang_timer, 0);
+    EXPECT_EQ(st.corr_hp_fast, 13106);
+    EXPECT_EQ(st.speech_vad_decision, 0);
+}
+
+// After a burst of intermediate speech decisions, the decision stays 1 for
+// the hangover length (4 in quiet, 7 in noisy backgrounds) and then drops.
+TEST(Vad1, HangoverFollowsABurst) {
+    for (int bg_amp : {20, 1500}) {
+        vad1_state st;
+        vad1_init(&st);
+        frame_buf buf;
+        noise_gen bg(bg_amp, 1), loud(12000, 2);
+        for (int f = 0; f < 200; ++f) {
+            buf.next(bg);
+            vad1(&st, buf.fresh());
+        }
+        ASSERT_EQ(st.speech_vad_decision, 0) << bg_amp;
+        for (int f = 0; f < 8; ++f) {
+            buf.next(loud);
+            EXPECT_EQ(vad1(&st, buf.fresh()), 1);
+        }
+        // Background again: the first frames may still see the burst through
+        // the look-ahead; count the decisions after the last intermediate 1.
+        int noise_level = 0;
+        int after_last = 0;
+        for (int f = 0; f < 30; ++f) {
+            int sum = 0;
+            for (int i = 0; i < VAD_BANDS; ++i) sum += st.bckr_est[i];
+            buf.next(bg);
+            const Word16 d = vad1(&st, buf.fresh());
+            if (st.vadreg & 0x4000) {
+                after_last = 0;
+                noise_level = sum >> 3;
+                EXPECT_EQ(d, 1);
+            } else if (d) {
+                ++after_last;
+            } else {
+                break;
+            }
+        }
+        EXPECT_EQ(after_last, noise_level > 100 ? 7 : 4) << "background " << bg_amp;
+    }
+}
+
+// More than 100 frames of high high-pass correlation start a complex hangover
+// of 250 frames during which every frame is speech.
+TEST(Vad1, LongCorrelatedBackgroundForcesSpeech) {
+    vad1_state st;
+    vad1_init(&st);
+    frame_buf buf;
+    noise_gen bg(300, 3);
+    int frames_to_hang = -1;
+    for (int f = 0; f < 400 && frames_to_hang < 0; ++f) {
+        st.best_corr_hp = 32000;   // what open-loop pitch reports
+        buf.next(bg);
+        vad1(&st, buf.fresh());
+        if (st.complex_hang_count != 0) frames_to_hang = f;
+    }
+    ASSERT_GT(frames_to_hang, 100);
+    EXPECT_EQ(st.complex_hang_count, 249);   // set to 250, one frame used
+    // Correlation gone: the hangover still runs out frame by frame.
+    int ones = 0;
+    for (int f = 0; f < 300; ++f) {
+        st.best_corr_hp = 0;
+        buf.next(bg);
+        if (vad1(&st, buf.fresh()) == 0) break;
+        ++ones;
+    }
+    EXPECT_GE(ones, 249);
+}
+
+// ---- option 2 -------------------------------------------------------------------
+
+// The transform equals a 128-point DFT of the real input divided by 64.
+TEST(Vad2, RealFftMatchesDft) {
+    std::mt19937 rng(7);
+    std::uniform_int_distribution<int> d(-4000, 4000);
+    for (int trial = 0; trial < 3; ++trial) {
+        Word16 x[128];
+        std::vector<double> in(128);
+        for (int i = 0; i < 128; ++i) in[i] = x[i] = static_cast<Word16>(d(rng));
+        r_fft(x);
+        auto dft = [&](int k, bool im) {
+            double acc = 0;
+            for (int n = 0; n < 128; ++n) {
+                const double a = 2 * PI * k * n / 128;
+                acc += in[n] * (im ? -std::sin(a) : std::cos(a));
+            }
+            return acc / 64;
+        };
+        EXPECT_NEAR(x[0], dft(0, false), 4);
+        EXPECT_NEAR(x[1], dft(64, false), 4);
+        for (int k = 1; k < 64; ++k) {
+            EXPECT_NEAR(x[2 * k], dft(k, false), 4) << k;
+            EXPECT_NEAR(x[2 * k + 1], dft(k, true), 4) << k;
+        }
+    }
+}
+
+TEST(Vad2, SilenceIsInactive) {
+    vad2_state st;
+    vad2_init(&st);
+    Word16 zero[80] = {};
+    for (int i = 0; i < 20; ++i) EXPECT_EQ(vad2(zero, &st), 0);
+    EXPECT_EQ(st.Lframe_cnt, 20);
+}
+
+// A loud onset over a settled noise floor is active, and the detector holds
+// the decision for a hangover after the onset ends.
+TEST(Vad2, OnsetOverNoiseIsActiveWithHangover) {
+    vad2_state st;
+    vad2_init(&st);
+    noise_gen bg(30, 4);
+    Word16 half[80];
+    for (int f = 0; f < 200; ++f) {
+        for (auto &v : half) v = bg();
+        vad2(half, &st);
+    }
+    for (auto &v : half) v = bg();
+    EXPECT_EQ(vad2(half, &st), 0);
+
+    sine_gen voice(300, 10000);
+    int active = 0;
+    for (int f = 0; f < 20; ++f) {
+        for (auto &v : half) v = static_cast<Word16>(voice() + bg());
+        active += vad2(half, &st);
+    }
+    EXPECT_GE(active, 18);
+    for (auto &v : half) v = bg();
+    EXPECT_EQ(vad2(half, &st), 1);   // hangover
+    int tail = 1;
+    for (int f = 0; f < 60; ++f) {
+        for (auto &v : half) v = bg();
+        if (vad2(half, &st) == 0) break;
+        ++tail;
+    }
+    EXPECT_LT(tail, 40);
+}
+
+// ---- the per-frame entry point ----------------------------------------------------
+
+namespace {
+
+struct encoder_fixture {
+    vamrnb_encoder enc{};
+    enc_frame fr{};
+    explicit encoder_fixture(int vad_option) {
+        enc.config.enc.dtx = 1;
+        enc.config.enc.vad_option = vad_option;
+        dtx_enc_init(&enc.dtx);
+    }
+    void frame(Word16 amp, unsigned seed) {
+        noise_gen g(amp, seed);
+        std::memmove(enc.old_speech, enc.old_speech + 160, 160 * sizeof(Word16));
+        for (int i = 160; i < 320; ++i) enc.old_speech[i] = g();
+        fr = enc_frame{};
+        fr.mode = fr.used_mode = 7;
+        vamrnbe_vad(&enc, &fr);
+    }
+};
+
+}  // namespace
+
+// Option 2 processes both halves of every frame.
+TEST(VadEntry, Option2RunsOnBothHalves) {
+    encoder_fixture e(1);
+    for (int f = 0; f < 3; ++f) e.frame(0, 0);
+    EXPECT_EQ(e.enc.vad.v2.Lframe_cnt, 6);
+}
+
+// A configuration word other than 0 or 1 selects option 1 at frame time,
+// running on whatever state creation left (all zero for such a value).
+TEST(VadEntry, OtherOptionValuesRunOptionOne) {
+    encoder_fixture e(2);
+    vad1_state ref{};
+    frame_buf shadow;
+    for (int f = 0; f < 5; ++f) {
+        e.frame(2000, 10 + f);
+        std::memcpy(shadow.s, e.enc.old_speech + 120, 200 * sizeof(Word16));
+        const Word16 d = vad1(&ref, shadow.fresh());
+        EXPECT_EQ(e.fr.vad_flag, d);
+    }
+    EXPECT_EQ(std::memcmp(&e.enc.vad.v1, &ref, sizeof ref), 0);
+}
