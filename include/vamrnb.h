@@ -119,6 +119,16 @@ VAMRNB_API int32_t vamrnbe_encode(vamrnb_encoder *enc, const pcm_buffer *in,
 VAMRNB_API int32_t vamrnbe_set_mode(vamrnb_encoder *enc, int32_t mode);
 VAMRNB_API void    vamrnbe_delete(vamrnb_encoder *enc);
 
+/* ---- processor features ------------------------------------------------
+ * The signal-processing kernels pick vector code for the features the
+ * processor has.  vamrnb_set_cpu_flags restricts them to the features in mask
+ * (0: portable scalar code only; the default allows all) and returns the
+ * previous mask.  Every choice gives the same output bits. */
+#define VAMRNB_CPU_SSE41 0x1u
+#define VAMRNB_CPU_AVX2  0x2u
+#define VAMRNB_CPU_NEON  0x4u
+VAMRNB_API uint32_t vamrnb_set_cpu_flags(uint32_t mask);
+
 #ifdef __cplusplus
 }
 #endif

@@ -1,0 +1,76 @@
+// Run-time selection of the subframe kernels.  Every kernel has a portable
+// scalar version (the definition of its result) and may have vector versions
+// for SSE4.1, AVX2 or NEON that produce identical bits.  A table of function
+// pointers per feature set is chosen once from the processor's features,
+// restricted by the mask set with vamrnb_set_cpu_flags.
+#pragma once
+
+#include <cstdint>
+
+#include "basic_op/basic_op.h"
+
+namespace vamrnb {
+
+// Feature bits; equal to the public VAMRNB_CPU_* values.
+inline constexpr uint32_t kCpuSse41 = 1u << 0;
+inline constexpr uint32_t kCpuAvx2 = 1u << 1;
+inline constexpr uint32_t kCpuNeon = 1u << 2;
+
+using SynFiltFn = void (*)(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
+using SynFiltMFn = void (*)(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
+using ResiduFn = void (*)(const Word16 *a, const Word16 *x, Word16 *y);
+using PredLtFn = void (*)(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
+using EnergyFn = Word32 (*)(const Word16 *x, Word32 n, Word32 init);
+using InnerProductFn = Word32 (*)(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+
+struct DspKernels {
+    SynFiltFn syn_filt;
+    SynFiltMFn syn_filt_m;
+    ResiduFn residu;
+    PredLtFn pred_lt_3or6;
+    EnergyFn energy;
+    InnerProductFn inner_product;
+};
+
+// The kernel set in use (selected on first call).
+const DspKernels &dsp();
+
+// The kernel set for the given feature bits (bits the build or the processor
+// lacks are ignored).  Used by the tests to run every version side by side.
+const DspKernels &dsp_for(uint32_t flags);
+
+// Features of this processor that the build has vector code for.
+uint32_t cpu_detect();
+
+// ---- portable versions ------------------------------------------------------
+void syn_filt_c(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
+void syn_filt_m_c(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
+void residu_c(const Word16 *a, const Word16 *x, Word16 *y);
+void pred_lt_3or6_c(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
+Word32 energy_c(const Word16 *x, Word32 n, Word32 init);
+Word32 inner_product_c(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+
+// ---- vector versions (defined only where the build targets them) -----------
+#if defined(__x86_64__) || defined(__i386__)
+#define VAMRNB_DSP_X86 1
+void syn_filt_sse41(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
+void syn_filt_m_sse41(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
+void residu_sse41(const Word16 *a, const Word16 *x, Word16 *y);
+void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
+Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init);
+Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+void residu_avx2(const Word16 *a, const Word16 *x, Word16 *y);
+void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
+#endif
+
+#if defined(__ARM_NEON) || defined(__ARM_NEON__)
+#define VAMRNB_DSP_NEON 1
+void syn_filt_neon(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
+void syn_filt_m_neon(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
+void residu_neon(const Word16 *a, const Word16 *x, Word16 *y);
+void pred_lt_3or6_neon(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
+Word32 energy_neon(const Word16 *x, Word32 n, Word32 init);
+Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+#endif
+
+}  // namespace vamrnb

@@ -1,0 +1,38 @@
+// Adaptive-codebook vector: the past excitation at an integer delay plus a
+// fraction (1/3 or 1/6 resolution), interpolated with the 1/6-resolution
+// FIR of 2 × 10 taps.  Outputs overwrite exc[0..39] in order, so with a delay
+// shorter than the subframe later outputs read earlier ones.
+#include "lpc/dsp.h"
+#include "lpc/lpc.h"
+#include "lpc/tables.h"
+
+namespace vamrnb {
+
+void pred_lt_3or6_c(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
+    constexpr int kUp = 6;
+    Word32 f = -frac;
+    if (flag3 != 0) f *= 2;            // 1/3 grid onto the 1/6 grid
+    const Word16 *x0 = exc - T0;
+    if (f < 0) {
+        f += kUp;
+        --x0;
+    }
+    const Word16 *c1 = &vamrnb_tbl_pred_inter_6[f];
+    const Word16 *c2 = &vamrnb_tbl_pred_inter_6[kUp - f];
+    for (int j = 0; j < L_SUBFR; ++j) {
+        const Word16 *x1 = x0 + j;
+        const Word16 *x2 = x0 + j + 1;
+        Word32 s = 0;
+        for (int i = 0; i < L_INTERPOL - 1; ++i) {
+            s = l_mac(s, x1[-i], c1[kUp * i]);
+            s = l_mac(s, x2[i], c2[kUp * i]);
+        }
+        exc[j] = round16(s);
+    }
+}
+
+}  // namespace vamrnb
+
+extern "C" void vamrnb_pred_lt_3or6(int32_t T0, int32_t frac, int32_t flag3, int16_t *exc) {
+    vamrnb::dsp().pred_lt_3or6(T0, frac, flag3, exc);
+}
