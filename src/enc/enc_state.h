@@ -128,4 +128,36 @@ extern "C" {
 void vamrnbe_preproc(vamrnb::enc_state *st, vamrnb::enc_frame *fr, int16_t *in);
 void vamrnbe_lpc(vamrnb::enc_state *st, vamrnb::enc_frame *fr);
 void vamrnbe_olp(vamrnb::enc_state *st, vamrnb::enc_frame *fr, vamrnb::vad_area *vad);
+
+// LP analysis building blocks (240-sample window, order 10).
+void    vamrnbe_windowing(const int16_t *x, const int16_t *window, int16_t *y);
+int32_t vamrnbe_auto_corr(int16_t *y, int16_t r_h[11], int16_t r_l[11]);
+void    vamrnbe_lag_window(int16_t r_h[11], int16_t r_l[11]);
+void    vamrnbe_levinson(int16_t old_A[11], const int16_t r_h[11], const int16_t r_l[11],
+                         int16_t A[11], int16_t rc[4]);
+
+// LSF quantisation.  `past_rq` is the predictor memory; `pred_init_i` is
+// written only in MRDTX.
+void    vamrnbe_q_plsf_3(int32_t mode, const int16_t lsp[10], int16_t lsp_q[10],
+                         int16_t past_rq[10], int16_t indices[3], int16_t *pred_init_i);
+int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *dico,
+                          const int16_t *w1, const int16_t *w2, int32_t size);
+int16_t vamrnbe_vq_subvec_s(int16_t *r1, int16_t *r2, const int16_t *dico,
+                            const int16_t *w1, const int16_t *w2, int32_t size);
+int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int16_t *w, int32_t size);
+
+// Open-loop pitch: correlation of x[0..len-1] with x[-lag..] for lag_max
+// down to lag_min, stored at corr[-lag].
+void    vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max, int32_t lag_min,
+                          int32_t *corr);
 }
+
+namespace vamrnb {
+// LSF weighting factors of the split quantisers (Q13).
+void lsf_wt(const Word16 lsf[M], Word16 wf[M]);
+// LPC to LSP root search; keeps old_lsp when fewer than 10 roots are found.
+Word16 chebps(Word16 x, const Word16 *f, int n);
+void az_lsp(const Word16 a[MP1], Word16 lsp[M], const Word16 old_lsp[M]);
+// Tone-stability check on the new unquantised LSPs; updates the counter.
+Word16 check_lsp(int32_t *count, const Word16 lsp[M]);
+}  // namespace vamrnb

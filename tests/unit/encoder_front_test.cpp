@@ -1,0 +1,232 @@
+// Encoder front end: pre-filter, LP analysis pieces, LSF search kernels,
+// tone-stability check and open-loop pitch.
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <cstring>
+#include <memory>
+#include <vector>
+
+#include "enc/enc_state.h"
+#include "lpc/tables.h"
+
+using namespace vamrnb;
+
+namespace {
+
+std::unique_ptr<enc_state> fresh_state() {
+    auto st = std::make_unique<enc_state>();
+    std::memset(static_cast<void *>(st.get()), 0, sizeof(enc_state));
+    st->old_A[0] = 4096;
+    return st;
+}
+
+}  // namespace
+
+// ---- pre-processing ----------------------------------------------------------
+
+TEST(EncPreproc, MasksCallerBufferAndHalvesIntoFilter) {
+    auto st = fresh_state();
+    enc_frame fr{};
+    std::vector<int16_t> in(L_FRAME);
+    for (int i = 0; i < L_FRAME; ++i) in[i] = static_cast<int16_t>(4000 + (i % 8));
+    vamrnbe_preproc(st.get(), &fr, in.data());
+
+    for (int16_t s : in) EXPECT_EQ(s, 4000) << "low three bits must be cleared in place";
+    // First output: 2 * 4000 * 1899 scaled by 8, rounded to the high half.
+    EXPECT_EQ(st->old_speech[ENC_NEW_SPEECH], 1854);
+    // A constant input is removed by the high-pass filter within a frame.
+    EXPECT_LT(std::abs(st->old_speech[ENC_SPEECH_LEN - 1]), 40);
+}
+
+TEST(EncPreproc, FullScaleOutputSaturatesInTheScaling) {
+    auto st = fresh_state();
+    enc_frame fr{};
+    // Two large previous outputs and a full-scale input push the sum past
+    // what the final scaling by 8 can hold.
+    st->y1_hi = 30000;
+    st->y2_hi = 30000;
+    std::vector<int16_t> in(L_FRAME, 32767);
+    vamrnbe_preproc(st.get(), &fr, in.data());
+    EXPECT_EQ(in[0], 32760);
+    EXPECT_EQ(st->old_speech[ENC_NEW_SPEECH], 32767);
+    EXPECT_EQ(st->x0, 32760);
+    EXPECT_EQ(st->x1, 32760);
+}
+
+// ---- autocorrelation and Levinson ---------------------------------------------
+
+TEST(EncLpc, AutocorrScalesDownOnOverflow) {
+    std::vector<int16_t> y(240, 32767);
+    int16_t r_h[11], r_l[11];
+    const int32_t norm = vamrnbe_auto_corr(y.data(), r_h, r_l);
+    EXPECT_EQ(y[0], 2047) << "the window is divided by 4 until its energy fits";
+    EXPECT_LT(norm, 0);
+    EXPECT_GE(r_h[0], 16384);
+    for (int k = 1; k <= 10; ++k) EXPECT_LE(r_h[k], r_h[0]);
+
+    std::vector<int16_t> z(240, 0);
+    vamrnbe_auto_corr(z.data(), r_h, r_l);
+    EXPECT_EQ(r_h[0], 16384) << "an all-zero window still gives a usable r[0]";
+    EXPECT_EQ(r_h[5], 0);
+}
+
+TEST(EncLpc, WindowingAndLagWindowMatchStandAloneForms) {
+    std::vector<int16_t> x(240), y(240);
+    for (int i = 0; i < 240; ++i) x[i] = static_cast<int16_t>(3000 * std::sin(i * 0.3));
+    vamrnbe_windowing(x.data(), tab::window_200_40, y.data());
+    EXPECT_EQ(y[0], mult_r(x[0], 2621));
+    int16_t r_h[11], r_l[11];
+    vamrnbe_auto_corr(y.data(), r_h, r_l);
+    const int16_t h1 = r_h[1];
+    vamrnbe_lag_window(r_h, r_l);
+    EXPECT_LT(r_h[1], h1) << "the lag window attenuates lag 1";
+}
+
+TEST(EncLpc, LevinsonFallsBackToLastStableFilter) {
+    int16_t old_A[11] = {4096, -100, 50, 0, 0, 0, 0, 0, 0, 0, 7};
+    int16_t A[11], rc[4] = {1, 1, 1, 1};
+    // r = (1, 0, 1, ...) is not positive definite: the second reflection
+    // coefficient reaches -1.
+    int16_t r_h[11] = {16384, 0, 16384}, r_l[11] = {};
+    vamrnbe_levinson(old_A, r_h, r_l, A, rc);
+    EXPECT_EQ(std::memcmp(A, old_A, sizeof A), 0);
+    for (int i = 0; i < 4; ++i) EXPECT_EQ(rc[i], 0);
+    EXPECT_EQ(old_A[1], -100) << "the fall-back leaves the stored filter alone";
+
+    // A first-order process r[k] = 0.5^k gives A(z) = 1 - 0.5 z^-1.
+    for (int i = 0; i < 11; ++i) r_h[i] = static_cast<int16_t>(16384 >> i), r_l[i] = 0;
+    vamrnbe_levinson(old_A, r_h, r_l, A, rc);
+    EXPECT_EQ(A[0], 4096);
+    EXPECT_NEAR(A[1], -2048, 2);
+    for (int i = 2; i <= 10; ++i) EXPECT_NEAR(A[i], 0, 2);
+    EXPECT_NEAR(rc[0], -16384, 4);
+    EXPECT_EQ(std::memcmp(A, old_A, sizeof A), 0) << "a stable result becomes the fall-back";
+}
+
+// ---- LSP root search ------------------------------------------------------------
+
+TEST(EncLpc, FlatFilterGivesEquallySpacedLsps) {
+    const int16_t a[11] = {4096, 0, 0, 0, 0, 0, 0, 0, 0, 0, 0};
+    int16_t old[10] = {}, lsp[10];
+    az_lsp(a, lsp, old);
+    // The roots of 1 +/- z^-11 lie at multiples of pi/11.
+    for (int k = 0; k < 10; ++k)
+        EXPECT_NEAR(lsp[k], 32768.0 * std::cos((k + 1) * M_PI / 11.0), 40) << k;
+}
+
+TEST(EncLpc, RootSearchFailureKeepsOldLsps) {
+    // A filter with a pole outside the unit circle does not interlace its
+    // roots; the search finds fewer than ten and returns the old vector.
+    const int16_t a[11] = {4096, 32767, 32767, 32767, 32767, 32767,
+                           32767, 32767, 32767, 32767, 32767};
+    const int16_t old[10] = {30000, 26000, 21000, 15000, 9000, 3000,
+                             -3000, -9000, -15000, -21000};
+    int16_t lsp[10];
+    az_lsp(a, lsp, old);
+    EXPECT_EQ(std::memcmp(lsp, old, sizeof lsp), 0);
+}
+
+// ---- tone stability ---------------------------------------------------------------
+
+TEST(EncLpc, ToneStabilityCounterSaturatesAndResets) {
+    // Two close LSPs among 4..8 signal a resonance.
+    int16_t resonant[10] = {30000, 26000, 21000, 15000, 14000, 8000, 2000, -4000, -10000, -20000};
+    int16_t smooth[10] = {30000, 26000, 21000, 15000, 9000, 3000, -3000, -9000, -15000, -21000};
+    int32_t count = 0;
+    for (int f = 1; f <= 11; ++f) {
+        EXPECT_EQ(check_lsp(&count, resonant), 0) << f;
+        EXPECT_EQ(count, f);
+    }
+    for (int f = 0; f < 5; ++f) {
+        EXPECT_EQ(check_lsp(&count, resonant), 1);
+        EXPECT_EQ(count, 12) << "the counter stops at 12";
+    }
+    EXPECT_EQ(check_lsp(&count, smooth), 0);
+    EXPECT_EQ(count, 0);
+}
+
+TEST(EncLpc, ToneStabilityThresholdFollowsFirstLsp) {
+    // Distance 900 between LSPs 2 and 3: resonant only below 30500 (threshold 1100).
+    int16_t lsp[10] = {32500, 30400, 29500, 15000, 9000, 3000, -3000, -9000, -15000, -21000};
+    int32_t count = 0;
+    check_lsp(&count, lsp);
+    EXPECT_EQ(count, 1);
+    lsp[1] = 30600;   // threshold 800
+    lsp[2] = 29700;
+    check_lsp(&count, lsp);
+    EXPECT_EQ(count, 0);
+    lsp[1] = 32100;   // threshold 600, distance 500
+    lsp[2] = 31600;
+    check_lsp(&count, lsp);
+    EXPECT_EQ(count, 1);
+}
+
+// ---- LSF search kernels -----------------------------------------------------------
+
+TEST(EncQuant, EqualDistancesPickTheLowestRow) {
+    // Rows 1 and 6 are identical and exact; rows in other lanes are worse.
+    std::vector<int16_t> dico(8 * 4, 1000);
+    const int16_t want[4] = {10, 20, 30, 40};
+    std::memcpy(&dico[1 * 4], want, sizeof want);
+    std::memcpy(&dico[6 * 4], want, sizeof want);
+    const int16_t w[4] = {8000, 8000, 8000, 8000};
+
+    int16_t r[4] = {10, 20, 30, 40};
+    EXPECT_EQ(vamrnbe_vq_subvec4(r, dico.data(), w, 8), 1);
+
+    int16_t r1[2] = {10, 20}, r2[2] = {30, 40};
+    EXPECT_EQ(vamrnbe_vq_subvec(r1, r2, dico.data(), w, w + 2, 8), 1);
+    EXPECT_EQ(r1[0], 10);
+    EXPECT_EQ(r2[1], 40);
+}
+
+TEST(EncQuant, SignedSearchSignAndNegation) {
+    // Weights and values chosen so that the weighted differences are exact
+    // for both signs.
+    std::vector<int16_t> dico = {512, 512, 512, 512, -32768, 128, 256, 384};
+    const int16_t w[2] = {8192, 8192};
+    // Zero residual: + and - distances are equal for every row; sign 0 wins.
+    int16_t r1[2] = {0, 0}, r2[2] = {0, 0};
+    int16_t idx = vamrnbe_vq_subvec_s(r1, r2, dico.data(), w, w, 2);
+    EXPECT_EQ(idx & 1, 0);
+
+    // Residual equal to the negated second row: index 1, sign 1, and the
+    // negation of -32768 saturates to 32767.
+    int16_t s1[2] = {32767, -128}, s2[2] = {-256, -384};
+    idx = vamrnbe_vq_subvec_s(s1, s2, dico.data(), w, w, 2);
+    EXPECT_EQ(idx, 2 * 1 + 1);
+    EXPECT_EQ(s1[0], 32767);
+    EXPECT_EQ(s1[1], -128);
+    EXPECT_EQ(s2[1], -384);
+}
+
+TEST(EncQuant, WeightsFollowLsfSpacing) {
+    // Evenly spaced LSFs: every inner weight sees the same spacing.
+    int16_t lsf[10], wf[10];
+    for (int i = 0; i < 10; ++i) lsf[i] = static_cast<int16_t>(1500 * (i + 1));
+    lsf_wt(lsf, wf);
+    for (int i = 1; i < 9; ++i) EXPECT_EQ(wf[i], wf[1]);
+    // Closer LSFs weigh more.
+    lsf[5] = lsf[4] + 100;
+    lsf[6] = lsf[5] + 100;
+    int16_t wf2[10];
+    lsf_wt(lsf, wf2);
+    EXPECT_GT(wf2[5], wf[5]);
+}
+
+// ---- open-loop pitch ----------------------------------------------------------------
+
+TEST(EncOlp, CorrelationOfPeriodicSignalPeaksAtPeriod) {
+    std::vector<int16_t> buf(PIT_MAX + 160);
+    for (size_t i = 0; i < buf.size(); ++i) buf[i] = static_cast<int16_t>(i % 57 < 5 ? 4000 : 0);
+    std::vector<int32_t> corr(PIT_MAX + 1);
+    int32_t *c = corr.data() + PIT_MAX;
+    const int16_t *x = buf.data() + PIT_MAX;
+    vamrnbe_comp_corr(x, 80, PIT_MAX, 20, c);
+    int best = 20;
+    for (int lag = 20; lag <= PIT_MAX; ++lag)
+        if (c[-lag] > c[-best]) best = lag;
+    EXPECT_TRUE(best == 57 || best == 114) << best;
+    EXPECT_EQ(c[-57], c[-114]);
+}
