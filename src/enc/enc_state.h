@@ -125,31 +125,31 @@ inline Word16 *enc_wsp(enc_state *st) { return st->old_wsp + ENC_WSP; }
 
 // Frame-level stages (instance, work record).
 extern "C" {
-void vamrnbe_preproc(vamrnb::enc_state *st, vamrnb::enc_frame *fr, int16_t *in);
-void vamrnbe_lpc(vamrnb::enc_state *st, vamrnb::enc_frame *fr);
-void vamrnbe_olp(vamrnb::enc_state *st, vamrnb::enc_frame *fr, vamrnb::vad_area *vad);
+VAMRNB_API void vamrnbe_preproc(vamrnb::enc_state *st, vamrnb::enc_frame *fr, int16_t *in);
+VAMRNB_API void vamrnbe_lpc(vamrnb::enc_state *st, vamrnb::enc_frame *fr);
+VAMRNB_API void vamrnbe_olp(vamrnb::enc_state *st, vamrnb::enc_frame *fr, vamrnb::vad_area *vad);
 
 // LP analysis building blocks (240-sample window, order 10).
-void    vamrnbe_windowing(const int16_t *x, const int16_t *window, int16_t *y);
-int32_t vamrnbe_auto_corr(int16_t *y, int16_t r_h[11], int16_t r_l[11]);
-void    vamrnbe_lag_window(int16_t r_h[11], int16_t r_l[11]);
-void    vamrnbe_levinson(int16_t old_A[11], const int16_t r_h[11], const int16_t r_l[11],
-                         int16_t A[11], int16_t rc[4]);
+VAMRNB_API void    vamrnbe_windowing(const int16_t *x, const int16_t *window, int16_t *y);
+VAMRNB_API int32_t vamrnbe_auto_corr(int16_t *y, int16_t r_h[11], int16_t r_l[11]);
+VAMRNB_API void    vamrnbe_lag_window(int16_t r_h[11], int16_t r_l[11]);
+VAMRNB_API void    vamrnbe_levinson(int16_t old_A[11], const int16_t r_h[11], const int16_t r_l[11],
+                                    int16_t A[11], int16_t rc[4]);
 
 // LSF quantisation.  `past_rq` is the predictor memory; `pred_init_i` is
 // written only in MRDTX.
-void    vamrnbe_q_plsf_3(int32_t mode, const int16_t lsp[10], int16_t lsp_q[10],
-                         int16_t past_rq[10], int16_t indices[3], int16_t *pred_init_i);
-int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *dico,
-                          const int16_t *w1, const int16_t *w2, int32_t size);
-int16_t vamrnbe_vq_subvec_s(int16_t *r1, int16_t *r2, const int16_t *dico,
-                            const int16_t *w1, const int16_t *w2, int32_t size);
-int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int16_t *w, int32_t size);
+VAMRNB_API void    vamrnbe_q_plsf_3(int32_t mode, const int16_t lsp[10], int16_t lsp_q[10],
+                                    int16_t past_rq[10], int16_t indices[3], int16_t *pred_init_i);
+VAMRNB_API int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *dico,
+                                     const int16_t *w1, const int16_t *w2, int32_t size);
+VAMRNB_API int16_t vamrnbe_vq_subvec_s(int16_t *r1, int16_t *r2, const int16_t *dico,
+                                       const int16_t *w1, const int16_t *w2, int32_t size);
+VAMRNB_API int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int16_t *w, int32_t size);
 
 // Open-loop pitch: correlation of x[0..len-1] with x[-lag..] for lag_max
 // down to lag_min, stored at corr[-lag].
-void    vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max, int32_t lag_min,
-                          int32_t *corr);
+VAMRNB_API void    vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max, int32_t lag_min,
+                                     int32_t *corr);
 }
 
 namespace vamrnb {
