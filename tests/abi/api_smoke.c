@@ -4,9 +4,9 @@
  * against the build tree by ctest, against an installed tree through
  * pkg-config by scripts/check_install.sh, and run by scripts/demo.sh.
  *
- * Entry points are referenced weakly so that the program links and runs while
- * parts of the codec are still being written; a missing entry point is
- * reported and its checks are skipped.
+ * The decoder and encoder entry points are referenced weakly so that the
+ * program links and runs while those parts of the codec are still being
+ * written; a missing entry point is reported and its checks are skipped.
  */
 #include <stdio.h>
 #include <string.h>
@@ -14,11 +14,6 @@
 #include "vamrnb.h"
 
 #if defined(__GNUC__)
-#pragma weak vamrnb_inited
-#pragma weak vamrnb_platform_init
-#pragma weak vamrnb_platform_deinit
-#pragma weak vamrnb_init
-#pragma weak vamrnb_deinit
 #pragma weak vamrnbd_create
 #pragma weak vamrnbd_decode
 #pragma weak vamrnbd_delete
@@ -46,16 +41,14 @@ static int present(int available, const char *what)
 
 static void lifecycle(void)
 {
-    if (!present(vamrnb_platform_init != NULL && vamrnb_init != NULL &&
-                 vamrnb_deinit != NULL && &vamrnb_inited != NULL,
-                 "library lifecycle"))
-        return;
     int32_t word = 7;
     check(vamrnb_platform_init(&word) == 0 && word == 0, "platform init clears its word");
     check(vamrnb_init() == 0 && vamrnb_inited == 1, "init sets the flag");
     check(vamrnb_init() == 0 && vamrnb_inited == 1, "second init is harmless");
     vamrnb_deinit();
     check(vamrnb_inited == 0, "deinit clears the flag");
+    check(vamrnb_platform_init(NULL) == 0, "platform init accepts a null pointer");
+    check(vamrnb_platform_deinit(5) == 5, "platform deinit returns its argument");
 }
 
 static void decoder(void)
