@@ -1,0 +1,325 @@
+// Algebraic codebooks of the six lower modes: two pulses (9 and 11 bits),
+// three pulses (14 bits) and four pulses (17 bits) on interleaved tracks of
+// step 5.  Each search fixes the pulse signs from the backward-filtered
+// target, then tries the pulse positions track by track, keeping the
+// combination with the largest (correlation^2 / energy); the winning code
+// vector is filtered and turned into a position index and a sign word.
+
+#include "enc/cbsearch_lowrate.h"
+
+#include "lpc/tables.h"
+
+namespace vamrnb {
+namespace {
+
+constexpr Word16 Q15_HALF = 16384;      // 1/2
+constexpr Word16 Q15_QUARTER = 8192;    // 1/4
+constexpr Word16 Q15_EIGHTH = 4096;     // 1/8
+constexpr Word16 Q15_SIXTEENTH = 2048;  // 1/16
+constexpr int STEP = 5;
+
+using matrix = Word16[L_CODE][L_CODE];
+
+// Signs of dn (dn becomes |dn|); dn2 keeps, per track, the n largest
+// magnitudes and marks the 8 - n smallest with -1.
+void set_sign(Word16 *dn, Word16 *sign, Word16 *dn2, int n) {
+    for (int i = 0; i < L_CODE; ++i) {
+        Word16 v = dn[i];
+        if (v >= 0) {
+            sign[i] = 32767;
+        } else {
+            sign[i] = -32767;
+            v = negate(v);
+        }
+        dn[i] = v;
+        dn2[i] = v;
+    }
+    for (int t = 0; t < 5; ++t) {
+        for (int k = 0; k < 8 - n; ++k) {
+            Word16 min = 0x7fff;
+            int pos = 0;
+            for (int j = t; j < L_CODE; j += STEP) {
+                if (dn2[j] >= 0 && dn2[j] < min) {
+                    min = dn2[j];
+                    pos = j;
+                }
+            }
+            dn2[pos] = -1;
+        }
+    }
+}
+
+// The candidate (sq, alp) beats the best so far (sqk, alpk) when
+// sq/alp > sqk/alpk, compared cross-multiplied.
+inline bool better(Word16 sq, Word16 alp, Word16 sqk, Word16 alpk) {
+    return l_msu(l_mult(alpk, sq), sqk, alp) > 0;
+}
+
+// Two pulses: first on the track starting at p0, second at p1.
+void search_pair(const Word16 *dn, const matrix &rr, int p0, int p1, Word16 &psk,
+                 Word16 &alpk, Word16 *codvec) {
+    for (int i0 = p0; i0 < L_CODE; i0 += STEP) {
+        const Word16 ps0 = dn[i0];
+        const Word32 alp0 = l_mult(rr[i0][i0], Q15_QUARTER);
+        Word16 sq = -1, alp = 1;
+        int ix = p1;
+        for (int i1 = p1; i1 < L_CODE; i1 += STEP) {
+            const Word16 ps1 = add(ps0, dn[i1]);
+            Word32 alp1 = l_mac(alp0, rr[i1][i1], Q15_QUARTER);
+            alp1 = l_mac(alp1, rr[i0][i1], Q15_HALF);
+            const Word16 sq1 = mult(ps1, ps1);
+            const Word16 alp_16 = round16(alp1);
+            if (better(sq1, alp_16, sq, alp)) {
+                sq = sq1;
+                alp = alp_16;
+                ix = i1;
+            }
+        }
+        if (better(sq, alp, psk, alpk)) {
+            psk = sq;
+            alpk = alp;
+            codvec[0] = static_cast<Word16>(i0);
+            codvec[1] = static_cast<Word16>(ix);
+        }
+    }
+}
+
+// Three or four pulses, the later pulses chosen one track at a time.
+void search_multi(int n_pulse, const Word16 *dn, const Word16 *dn2, const matrix &rr,
+                  const int *ipos, Word16 &psk, Word16 &alpk, Word16 *codvec) {
+    for (int i0 = ipos[0]; i0 < L_CODE; i0 += STEP) {
+        if (dn2[i0] < 0) continue;
+
+        // Second pulse.
+        Word16 ps0 = dn[i0];
+        Word32 alp0 = l_mult(rr[i0][i0], Q15_QUARTER);
+        Word16 sq = -1, alp = 1, ps = 0;
+        int ix = ipos[1];
+        for (int i1 = ipos[1]; i1 < L_CODE; i1 += STEP) {
+            const Word16 ps1 = add(ps0, dn[i1]);
+            Word32 alp1 = l_mac(alp0, rr[i1][i1], Q15_QUARTER);
+            alp1 = l_mac(alp1, rr[i0][i1], Q15_HALF);
+            const Word16 sq1 = mult(ps1, ps1);
+            const Word16 alp_16 = round16(alp1);
+            if (better(sq1, alp_16, sq, alp)) {
+                sq = sq1;
+                ps = ps1;
+                alp = alp_16;
+                ix = i1;
+            }
+        }
+        const int i1 = ix;
+
+        // Third pulse.
+        ps0 = ps;
+        alp0 = l_mult(alp, Q15_QUARTER);
+        sq = -1;
+        alp = 1;
+        ps = 0;
+        ix = ipos[2];
+        for (int i2 = ipos[2]; i2 < L_CODE; i2 += STEP) {
+            const Word16 ps1 = add(ps0, dn[i2]);
+            Word32 alp1 = l_mac(alp0, rr[i2][i2], Q15_SIXTEENTH);
+            alp1 = l_mac(alp1, rr[i1][i2], Q15_EIGHTH);
+            alp1 = l_mac(alp1, rr[i0][i2], Q15_EIGHTH);
+            const Word16 sq1 = mult(ps1, ps1);
+            const Word16 alp_16 = round16(alp1);
+            if (better(sq1, alp_16, sq, alp)) {
+                sq = sq1;
+                ps = ps1;
+                alp = alp_16;
+                ix = i2;
+            }
+        }
+        const int i2 = ix;
+
+        if (n_pulse == 4) {
+            // Fourth pulse.
+            ps0 = ps;
+            alp0 = l_deposit_h(alp);
+            sq = -1;
+            alp = 1;
+            ps = 0;
+            ix = ipos[3];
+            for (int i3 = ipos[3]; i3 < L_CODE; i3 += STEP) {
+                const Word16 ps1 = add(ps0, dn[i3]);
+                Word32 alp1 = l_mac(alp0, rr[i3][i3], Q15_SIXTEENTH);
+                alp1 = l_mac(alp1, rr[i2][i3], Q15_EIGHTH);
+                alp1 = l_mac(alp1, rr[i1][i3], Q15_EIGHTH);
+                alp1 = l_mac(alp1, rr[i0][i3], Q15_EIGHTH);
+                const Word16 sq1 = mult(ps1, ps1);
+                const Word16 alp_16 = round16(alp1);
+                if (better(sq1, alp_16, sq, alp)) {
+                    sq = sq1;
+                    ps = ps1;
+                    alp = alp_16;
+                    ix = i3;
+                }
+            }
+        }
+
+        if (better(sq, alp, psk, alpk)) {
+            psk = sq;
+            alpk = alp;
+            codvec[0] = static_cast<Word16>(i0);
+            codvec[1] = static_cast<Word16>(i1);
+            codvec[2] = static_cast<Word16>(i2);
+            if (n_pulse == 4) codvec[3] = static_cast<Word16>(ix);
+        }
+    }
+}
+
+// Position index of a pulse in its track (pos / 5) and the track (pos % 5).
+inline void split_pos(Word16 pos, Word16 *index, Word16 *track) {
+    *index = mult(pos, 6554);
+    *track = sub(pos, extract_l(l_shr(l_mult(*index, 5), 1)));
+}
+
+}  // namespace
+
+void filter_pulses(const Word16 *h, const Word16 *codvec, const Word16 *signs, int n,
+                   Word16 *y) {
+    for (int i = 0; i < L_CODE; ++i) {
+        Word32 s = 0;
+        for (int k = 0; k < n; ++k) {
+            // h is zero before its start: such terms add nothing.
+            if (i >= codvec[k]) s = l_mac(s, h[i - codvec[k]], signs[k]);
+        }
+        y[i] = round16(s);
+    }
+}
+
+Word16 code_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *x, Word16 *h, Word16 T0,
+                    Word16 pitch_sharp, Word16 *code, Word16 *y, Word16 *sign_word) {
+    const Word16 sharp = shl(pitch_sharp, 1);
+    if (T0 < L_CODE) {
+        for (int i = T0; i < L_CODE; ++i) h[i] = add(h[i], mult(h[i - T0], sharp));
+    }
+
+    Word16 dn[L_CODE], dn2[L_CODE], dn_sign[L_CODE];
+    alignas(16) Word16 rr[L_CODE][L_CODE];
+    vamrnbe_cor_h_x(h, x, dn, 1);
+
+    int n_pulse;
+    if (mode <= MR59) {
+        n_pulse = 2;
+    } else if (mode == MR67) {
+        n_pulse = 3;
+    } else {
+        n_pulse = 4;
+    }
+    set_sign(dn, dn_sign, dn2, n_pulse == 2 ? 8 : (n_pulse == 3 ? 6 : 4));
+    cor_h(h, dn_sign, rr);
+
+    Word16 codvec[4] = {0, 1, 2, 3};
+    Word16 psk = -1, alpk = 1;
+    if (mode == MR475 || mode == MR515) {
+        for (int t = 0; t < 2; ++t) {
+            search_pair(dn, rr, tab::startPos[subfr_nr * 2 + 8 * t],
+                        tab::startPos[subfr_nr * 2 + 1 + 8 * t], psk, alpk, codvec);
+        }
+    } else if (mode == MR59) {
+        for (int t1 = 0; t1 < 2; ++t1) {
+            for (int t2 = 0; t2 < 4; ++t2) {
+                search_pair(dn, rr, tab::startPos1[t1], tab::startPos2[t2], psk, alpk, codvec);
+            }
+        }
+    } else if (mode == MR67) {
+        for (int t1 = 1; t1 < 4; t1 += 2) {
+            for (int t2 = 2; t2 < 5; t2 += 2) {
+                int ipos[3] = {0, t1, t2};
+                for (int r = 0; r < 3; ++r) {
+                    search_multi(3, dn, dn2, rr, ipos, psk, alpk, codvec);
+                    const int last = ipos[2];
+                    ipos[2] = ipos[1];
+                    ipos[1] = ipos[0];
+                    ipos[0] = last;
+                }
+            }
+        }
+    } else {
+        for (int t = 3; t < 5; ++t) {
+            int ipos[4] = {0, 1, 2, t};
+            for (int r = 0; r < 4; ++r) {
+                search_multi(4, dn, dn2, rr, ipos, psk, alpk, codvec);
+                const int last = ipos[3];
+                ipos[3] = ipos[2];
+                ipos[2] = ipos[1];
+                ipos[1] = ipos[0];
+                ipos[0] = last;
+            }
+        }
+    }
+
+    // Code vector, signs and the position index.
+    for (int i = 0; i < L_CODE; ++i) code[i] = 0;
+    Word16 signs[4];
+    Word16 indx = 0, rsign = 0;
+    for (int k = 0; k < n_pulse; ++k) {
+        const Word16 pos = codvec[k];
+        Word16 index, track;
+        split_pos(pos, &index, &track);
+        if (mode == MR475 || mode == MR515) {
+            // Which track pair was used is coded in the first pulse's index.
+            const Word16 first = tab::trackTable[subfr_nr * 5 + track];
+            if (k == 0) {
+                track = 0;
+                if (first != 0) index = add(index, 64);
+            } else {
+                track = 1;
+                index = shl(index, 3);
+            }
+        } else if (mode == MR59) {
+            switch (track) {
+            case 0: track = 1; index = shl(index, 6); break;
+            case 1:
+                if (k == 0) {
+                    track = 0;
+                    index = shl(index, 1);
+                } else {
+                    track = 1;
+                    index = add(shl(index, 6), 16);
+                }
+                break;
+            case 2: track = 1; index = add(shl(index, 6), 32); break;
+            case 3: track = 0; index = add(shl(index, 1), 1); break;
+            default: track = 1; index = add(shl(index, 6), 48); break;
+            }
+        } else if (mode == MR67) {
+            switch (track) {
+            case 0: break;
+            case 1: index = shl(index, 4); break;
+            case 2: index = shl(index, 8); break;
+            case 3: track = 1; index = add(shl(index, 4), 8); break;
+            default: track = 2; index = add(shl(index, 8), 128); break;
+            }
+        } else {
+            index = tab::gray[index];
+            switch (track) {
+            case 0: break;
+            case 1: index = shl(index, 3); break;
+            case 2: index = shl(index, 6); break;
+            case 3: index = shl(index, 10); break;
+            default: track = 3; index = add(shl(index, 10), 512); break;
+            }
+        }
+        if (dn_sign[pos] > 0) {
+            code[pos] = 8191;
+            signs[k] = 32767;
+            rsign = add(rsign, shl(1, track));
+        } else {
+            code[pos] = -8192;
+            signs[k] = MIN_16;
+        }
+        indx = add(indx, index);
+    }
+    *sign_word = rsign;
+    filter_pulses(h, codvec, signs, n_pulse, y);
+
+    if (T0 < L_CODE) {
+        for (int i = T0; i < L_CODE; ++i) code[i] = add(code[i], mult(code[i - T0], sharp));
+    }
+    return indx;
+}
+
+}  // namespace vamrnb
