@@ -1,0 +1,364 @@
+// Encoder subframe stages: pitch-gain quantiser and limits, lag ranges and
+// lag coding, and the algebraic codebooks checked by decoding their
+// parameters back into code vectors.
+
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <memory>
+#include <random>
+#include <set>
+#include <vector>
+
+#include "enc/cbsearch_lowrate.h"
+#include "enc/subframe.h"
+#include "lpc/tables.h"
+
+using namespace vamrnb;
+
+namespace {
+
+std::vector<Word16> noise(std::mt19937 &rng, int n, int amp) {
+    std::uniform_int_distribution<int> d(-amp, amp);
+    std::vector<Word16> v(n);
+    for (auto &x : v) x = static_cast<Word16>(d(rng));
+    return v;
+}
+
+// A decaying impulse response in Q12 with a random fine structure; the
+// 40 samples before it are zero, as the stages expect.
+struct impulse {
+    Word16 buf[2 * L_SUBFR] = {};
+    Word16 *h = buf + L_SUBFR;
+    explicit impulse(std::mt19937 &rng) {
+        std::uniform_int_distribution<int> d(-600, 600);
+        int amp = 4096;
+        for (int i = 0; i < L_SUBFR; ++i) {
+            h[i] = static_cast<Word16>(i == 0 ? 4096 : amp / 2 + d(rng) * amp / 4096);
+            amp = amp * 7 / 8;
+        }
+    }
+};
+
+const int16_t *pitch_tbl = vamrnb_tbl_qua_gain_pitch;
+
+}  // namespace
+
+// ---- scalar pitch-gain quantiser -------------------------------------------
+
+TEST(PitchGainQuantiser, NeverPicksAnEntryAboveTheLimit) {
+    for (Word16 limit : {Word16{0}, Word16{3276}, Word16{15565}, Word16{16384}, MAX_16}) {
+        for (int g = 0; g <= 19661; g += 97) {
+            for (int32_t mode : {MR122, MR795, MR74}) {
+                Word16 gain = static_cast<Word16>(g);
+                Word16 cand[3], cind[3];
+                const Word16 idx = vamrnbe_qgain_pitch(mode, limit, &gain, cand, cind);
+                ASSERT_GE(idx, 0);
+                ASSERT_LT(idx, 16);
+                if (idx != 0) {
+                    ASSERT_LE(pitch_tbl[idx], limit) << "gain " << g;
+                }
+                if (mode != MR122) {
+                    ASSERT_EQ(gain, pitch_tbl[idx]);
+                }
+            }
+        }
+    }
+    // Index 0 is allowed whatever the limit.
+    Word16 gain = 19661;
+    EXPECT_EQ(vamrnbe_qgain_pitch(MR74, 0, &gain, nullptr, nullptr), 0);
+    EXPECT_EQ(gain, 0);
+}
+
+TEST(PitchGainQuantiser, NearestEntryAndTieKeepsLowerIndex) {
+    Word16 gain = 9011;  // exactly between 8192 (index 3) and 9830 (index 4)
+    EXPECT_EQ(vamrnbe_qgain_pitch(MR74, MAX_16, &gain, nullptr, nullptr), 3);
+    gain = 9012;
+    EXPECT_EQ(vamrnbe_qgain_pitch(MR74, MAX_16, &gain, nullptr, nullptr), 4);
+    // MR122 returns the gain with its two lowest bits cleared.
+    gain = 3277;
+    EXPECT_EQ(vamrnbe_qgain_pitch(MR122, MAX_16, &gain, nullptr, nullptr), 1);
+    EXPECT_EQ(gain, 3276);
+}
+
+TEST(PitchGainQuantiser, Mr795CandidatesShiftInwardsAtTheEnds) {
+    struct {
+        Word16 gain, limit, first;
+    } cases[] = {
+        {0, MAX_16, 0},          // index 0: candidates 0, 1, 2
+        {19661, MAX_16, 13},     // index 15: 13, 14, 15
+        {19661, 15565, 8},       // limited at index 10: 8, 9, 10
+        {13107, MAX_16, 6},      // index 7: 6, 7, 8
+    };
+    for (const auto &c : cases) {
+        Word16 gain = c.gain, cand[3], cind[3];
+        const Word16 idx = vamrnbe_qgain_pitch(MR795, c.limit, &gain, cand, cind);
+        EXPECT_EQ(gain, pitch_tbl[idx]);
+        for (int i = 0; i < 3; ++i) {
+            EXPECT_EQ(cind[i], c.first + i) << "gain " << c.gain;
+            EXPECT_EQ(cand[i], pitch_tbl[c.first + i]);
+        }
+    }
+}
+
+// ---- pitch-gain limits -----------------------------------------------------
+
+TEST(PitchGainLimits, ClippingNeedsASumStrictlyAbove15565) {
+    Word16 gp[GP_HIST];
+    for (auto &g : gp) g = 2000;                 // history sums to 14000
+    EXPECT_FALSE(check_gp_clipping(gp, 12520));  // 14000 + 1565 = 15565
+    EXPECT_TRUE(check_gp_clipping(gp, 12528));   // 14000 + 1566
+
+    // A gain of exactly 15565 is not even tested against the history.
+    for (auto &g : gp) g = 4000;
+    Word16 gain = 15565, limit;
+    limit_pitch_gain(MR74, 1, gp, &gain, &limit);
+    EXPECT_EQ(gain, 15565);
+    EXPECT_EQ(limit, MAX_16);
+
+    gain = 15566;
+    limit_pitch_gain(MR74, 1, gp, &gain, &limit);
+    EXPECT_EQ(gain, 15565);
+    EXPECT_EQ(limit, 15565);
+
+    // Without resonance nothing is limited.
+    gain = 19000;
+    limit_pitch_gain(MR122, 0, gp, &gain, &limit);
+    EXPECT_EQ(gain, 19000);
+    EXPECT_EQ(limit, MAX_16);
+}
+
+TEST(PitchGainLimits, LowRateModesCapAt13926AndClipOnlyTheQuantiser) {
+    Word16 quiet[GP_HIST] = {}, loud[GP_HIST];
+    for (auto &g : loud) g = 4000;
+    for (int32_t mode : {MR475, MR515}) {
+        Word16 gain = 13927, limit;
+        limit_pitch_gain(mode, 0, quiet, &gain, &limit);
+        EXPECT_EQ(gain, 13926);
+        EXPECT_EQ(limit, MAX_16);
+
+        gain = 19000;
+        limit_pitch_gain(mode, 1, loud, &gain, &limit);
+        EXPECT_EQ(gain, 13926);
+        EXPECT_EQ(limit, 15565);
+    }
+    Word16 gain = 13927, limit;
+    limit_pitch_gain(MR59, 0, quiet, &gain, &limit);
+    EXPECT_EQ(gain, 13927);
+}
+
+// ---- lag search ranges and lag coding ---------------------------------------
+
+TEST(LagRange, StaysInsideLimitsWithFullWidth) {
+    Word16 lo, hi;
+    get_range(22, 5, 10, 20, PIT_MAX, &lo, &hi);
+    EXPECT_EQ(lo, 20);
+    EXPECT_EQ(hi, 30);
+    get_range(19, 3, 6, 18, PIT_MAX, &lo, &hi);  // MR122 starts at 18
+    EXPECT_EQ(lo, 18);
+    EXPECT_EQ(hi, 24);
+    get_range(141, 3, 6, 20, PIT_MAX, &lo, &hi);
+    EXPECT_EQ(lo, 137);
+    EXPECT_EQ(hi, 143);
+
+    for (int mode = MR475; mode <= MR122; ++mode) {
+        const int16_t *p = tab::mode_dep_parm + 9 * mode;
+        for (Word16 T = p[8]; T <= PIT_MAX; ++T) {
+            for (int rel = 0; rel < 2; ++rel) {
+                const Word16 low = p[4 + 2 * rel], range = p[5 + 2 * rel];
+                get_range(T, low, range, p[8], PIT_MAX, &lo, &hi);
+                ASSERT_EQ(hi - lo, range);
+                ASSERT_GE(lo, p[8]);
+                ASSERT_LE(hi, PIT_MAX);
+            }
+        }
+    }
+}
+
+namespace {
+
+// Checks that the indices of (lag, fraction) pairs listed in increasing
+// order increase strictly and stay inside [0, max_index].
+void expect_increasing(const std::vector<std::pair<int, int>> &lags, int max_index,
+                       Word16 (*code)(Word16, Word16)) {
+    int prev = -1;
+    for (auto [T, f] : lags) {
+        const int idx = code(static_cast<Word16>(T), static_cast<Word16>(f));
+        ASSERT_GT(idx, prev) << "lag " << T << " frac " << f;
+        ASSERT_LE(idx, max_index) << "lag " << T << " frac " << f;
+        prev = idx;
+    }
+}
+
+}  // namespace
+
+TEST(LagCoding, AbsoluteIndicesAreOrderedAndFillTheirBits) {
+    std::vector<std::pair<int, int>> third;
+    for (int T = 19; T <= 85; ++T) {
+        for (int f = -1; f <= 1; ++f) {
+            if ((T == 19 && f < 1) || (T == 85 && f > 0)) continue;
+            third.push_back({T, f});
+        }
+    }
+    for (int T = 86; T <= 143; ++T) third.push_back({T, 0});
+    ASSERT_EQ(third.size(), 256u);
+    expect_increasing(third, 255, [](Word16 T, Word16 f) { return enc_lag3(T, f, 0, 0, 0, 0, 0); });
+
+    std::vector<std::pair<int, int>> sixth;
+    for (int T = 17; T <= 94; ++T) {
+        for (int f = -2; f <= 3; ++f) {
+            if (T == 17 && f < 3) continue;
+            sixth.push_back({T, f});
+        }
+    }
+    for (int T = 95; T <= 143; ++T) sixth.push_back({T, 0});
+    ASSERT_EQ(sixth.size(), 512u);
+    expect_increasing(sixth, 511, [](Word16 T, Word16 f) { return enc_lag6(T, f, 0, 0); });
+}
+
+TEST(LagCoding, RelativeIndicesCoverTheReachableLags) {
+    // 5-bit form, range 50..59: from 49 1/3 to 59 2/3.
+    std::vector<std::pair<int, int>> five;
+    for (int T = 49; T <= 60; ++T) {
+        for (int f = -1; f <= 1; ++f) {
+            if ((T == 49 && f < 1) || (T == 60 && f > -1)) continue;
+            five.push_back({T, f});
+        }
+    }
+    expect_increasing(five, 31, [](Word16 T, Word16 f) { return enc_lag3(T, f, 0, 50, 59, 1, 0); });
+
+    // 4-bit form around the previous lag 55: fractions only next to it.
+    const std::vector<std::pair<int, int>> four = {
+        {50, 0}, {51, 0}, {52, 0}, {53, 0}, {53, 1}, {54, -1}, {54, 0}, {54, 1},
+        {55, -1}, {55, 0}, {55, 1}, {56, -1}, {56, 0}, {57, 0}, {58, 0}, {59, 0}};
+    expect_increasing(four, 15, [](Word16 T, Word16 f) { return enc_lag3(T, f, 55, 50, 59, 1, 1); });
+
+    // 6-bit form at 1/6 resolution: from 49 3/6 to 59 3/6 (61 values).
+    std::vector<std::pair<int, int>> six;
+    for (int T = 49; T <= 59; ++T) {
+        for (int f = -2; f <= 3; ++f) {
+            if (T == 49 && f < 3) continue;
+            six.push_back({T, f});
+        }
+    }
+    expect_increasing(six, 60, [](Word16 T, Word16 f) { return enc_lag6(T, f, 50, 1); });
+}
+
+// ---- algebraic codebooks -----------------------------------------------------
+
+namespace {
+
+// MR475/MR515 parameters back to the unsharpened code vector.
+void decode_9bit(int subfr, Word16 index, Word16 sign, Word16 *cod) {
+    const int pair = (index >> 6) & 1;
+    const int pos0 = (index & 7) * 5 + tab::startPos[pair * 8 + subfr * 2];
+    const int pos1 = ((index >> 3) & 7) * 5 + tab::startPos[pair * 8 + subfr * 2 + 1];
+    for (int i = 0; i < L_CODE; ++i) cod[i] = 0;
+    cod[pos0] = (sign & 1) ? 8191 : -8192;
+    cod[pos1] = (sign & 2) ? 8191 : -8192;
+}
+
+void sharpen_ref(Word16 *v, int T0, Word16 sharp) {
+    const Word16 fac = shl(sharp, 1);
+    for (int i = T0; i < L_CODE; ++i) v[i] = add(v[i], mult(v[i - T0], fac));
+}
+
+}  // namespace
+
+TEST(CodebookMr475Mr515, PulsesUseTheTracksOfEachSubframe) {
+    // The two track pairs (position mod 5) of each subframe.
+    const std::set<std::set<int>> pairs[4] = {
+        {{0, 2}, {1, 3}}, {{0, 3}, {2, 4}}, {{0, 2}, {1, 4}}, {{0, 3}, {1, 4}}};
+    std::mt19937 rng(475);
+    for (int32_t mode : {MR475, MR515}) {
+        for (int subfr = 0; subfr < 4; ++subfr) {
+            std::set<std::set<int>> seen;
+            for (int trial = 0; trial < 60; ++trial) {
+                impulse imp(rng);
+                const auto x = noise(rng, L_CODE, 3000);
+                Word16 code[L_CODE], y[L_CODE], sign, expect[L_CODE];
+                const Word16 index =
+                    code_lowrate(mode, subfr, x.data(), imp.h, 40, 9000, code, y, &sign);
+                decode_9bit(subfr, index, sign, expect);
+                std::set<int> residues;
+                for (int i = 0; i < L_CODE; ++i) {
+                    ASSERT_EQ(code[i], expect[i]) << "position " << i;
+                    if (code[i] != 0) residues.insert(i % 5);
+                }
+                ASSERT_EQ(residues.size(), 2u);
+                seen.insert(residues);
+            }
+            EXPECT_EQ(seen, pairs[subfr]) << "subframe " << subfr;
+        }
+    }
+}
+
+TEST(CodebookSharpening, AppliedOnlyForLagsBelow40) {
+    std::mt19937 rng(40);
+    for (int T0 : {20, 39, 40, 80}) {
+        for (int trial = 0; trial < 20; ++trial) {
+            impulse imp(rng);
+            Word16 h_before[L_CODE];
+            for (int i = 0; i < L_CODE; ++i) h_before[i] = imp.h[i];
+            const auto x = noise(rng, L_CODE, 3000);
+            Word16 code[L_CODE], y[L_CODE], sign, expect[L_CODE];
+            const Word16 sharp = 10000;
+            const Word16 index = code_lowrate(MR515, 1, x.data(), imp.h, static_cast<Word16>(T0),
+                                              sharp, code, y, &sign);
+            decode_9bit(1, index, sign, expect);
+            Word16 h_expect[L_CODE];
+            for (int i = 0; i < L_CODE; ++i) h_expect[i] = h_before[i];
+            if (T0 < 40) {
+                sharpen_ref(expect, T0, sharp);
+                sharpen_ref(h_expect, T0, sharp);
+            }
+            for (int i = 0; i < L_CODE; ++i) {
+                ASSERT_EQ(code[i], expect[i]) << "T0 " << T0 << " position " << i;
+                ASSERT_EQ(imp.h[i], h_expect[i]) << "T0 " << T0 << " h at " << i;
+            }
+        }
+    }
+}
+
+TEST(CodebookMr122, ParametersDecodeToTheCodeVector) {
+    auto st = std::make_unique<enc_state>();
+    auto fr = std::make_unique<enc_frame>();
+    std::mt19937 rng(122);
+    for (int trial = 0; trial < 40; ++trial) {
+        *st = enc_state{};
+        *fr = enc_frame{};
+        impulse imp(rng);
+        for (int i = 0; i < L_SUBFR; ++i) st->sub.hvec[L_SUBFR + i] = imp.h[i];
+        const auto x = noise(rng, L_SUBFR, 4000);
+        const auto r = noise(rng, L_SUBFR, 4000);
+        for (int i = 0; i < L_SUBFR; ++i) {
+            fr->sub.xn2[i] = x[i];
+            fr->sub.res2[i] = r[i];
+        }
+        fr->used_mode = MR122;
+        fr->sub.T0 = 60;  // no sharpening
+        fr->sub.gain_pit = 12000;
+        fr->prm_pos = 3;
+        vamrnbe_icb(st.get(), fr.get(), 40);
+        ASSERT_EQ(fr->prm_pos, 13);
+
+        // Decode as the receiver does: two pulses per track, the second
+        // pulse's sign follows from the order of the positions.
+        Word16 expect[L_CODE] = {};
+        const Word16 *ind = fr->prm + 3;
+        for (int j = 0; j < 5; ++j) {
+            const int pos1 = tab::dgray[ind[j] & 7] * 5 + j;
+            Word16 sign = (ind[j] & 8) ? -4096 : 4096;
+            expect[pos1] = sign;
+            const int pos2 = tab::dgray[ind[j + 5] & 7] * 5 + j;
+            if (pos2 < pos1) sign = negate(sign);
+            expect[pos2] = add(expect[pos2], sign);
+        }
+        int pulses = 0;
+        for (int i = 0; i < L_CODE; ++i) {
+            ASSERT_EQ(fr->sub.code[i], expect[i]) << "trial " << trial << " position " << i;
+            pulses += fr->sub.code[i] != 0;
+        }
+        EXPECT_GE(pulses, 5);
+    }
+}
