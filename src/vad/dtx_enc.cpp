@@ -6,15 +6,23 @@
 // coder's memories so that speech restarts from a clean state.
 #include "vad/dtx_enc.h"
 
+#include "vamrnb_dsp.h"
 #include "basic_op/ext_op.h"
+#include "enc/enc_state.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
 namespace {
 
+constexpr int32_t MODE_DTX = 8;
 constexpr Word16 LOG2_FRAME_Q10 = 8521;   // log2(160) in Q10
 constexpr Word16 SEED_MIN = -14436;
+constexpr Word16 MR122_SCALE = 5443;      // 20·log10(2) scaling, Q15
+
+// An MRDTX frame inside a shortened hangover normally repeats the stored SID
+// parameters; while the stored energy index is 0 they are refreshed anyway.
+constexpr bool REFRESH_ON_ZERO_INDEX = true;
 
 }  // namespace
 
@@ -65,3 +73,64 @@ Word16 dtx_gain_seed(Word16 log_en_index) {
 }
 
 }  // namespace vamrnb
+
+extern "C" void vamrnbe_dtx(vamrnb_encoder *st, vamrnb::enc_frame *fr) {
+    using namespace vamrnb;
+    dtx_enc_state *d = &st->dtx;
+
+    if (fr->compute_sid != 0 || (REFRESH_ON_ZERO_INDEX && d->log_en_index == 0)) {
+        // Averaged LSP vector of the history.
+        Word32 sum[M] = {};
+        for (int s = 0; s < DTX_HIST_SIZE; ++s)
+            for (int i = 0; i < M; ++i) sum[i] = l_add(sum[i], d->lsp_hist[s * M + i]);
+        Word16 lsp[M];
+        for (int i = 0; i < M; ++i) lsp[i] = extract_l(l_shr(sum[i], 3));
+
+        d->log_en_index = dtx_log_en_index(d);
+
+        // Speech resumes from the noise level.
+        const Word16 seed = dtx_gain_seed(d->log_en_index);
+        const Word16 seed_mr122 = mult(MR122_SCALE, seed);
+        for (int i = 0; i < 4; ++i) {
+            st->sub.pred.past_qua_en[i] = seed;
+            st->sub.pred.past_qua_en_MR122[i] = seed_mr122;
+        }
+
+        // Keep the averaged vector well ordered before quantising it.
+        Word16 lsf[M];
+        vamrnb_lsp_lsf(lsp, lsf);
+        vamrnb_reorder(lsf);
+        vamrnb_sf_sp(lsf, vamrnb_tbl_cos_lsp_lsf, lsp);
+
+        Word16 lsp_q[M];
+        vamrnbe_q_plsf_3(MODE_DTX, lsp, lsp_q, st->past_rq, d->lsp_index, &d->init_lsf_vq_index);
+    }
+
+    Word16 *prm = fr->prm;
+    prm[0] = d->init_lsf_vq_index;
+    prm[1] = d->lsp_index[0];
+    prm[2] = d->lsp_index[1];
+    prm[3] = d->lsp_index[2];
+    prm[4] = d->log_en_index;
+    fr->prm_pos = 5;
+
+    // Clear the speech coder's memories.
+    for (int i = 0; i < ENC_EXC; ++i) st->old_exc[i] = 0;
+    for (int i = 0; i < M; ++i) {
+        st->sub.mem_w0[i] = 0;
+        st->sub.mem_err[i] = 0;
+    }
+    for (int i = 0; i < L_SUBFR; ++i) {
+        st->sub.ai_zero[MP1 + i] = 0;
+        st->sub.hvec[i] = 0;
+    }
+    for (int i = 0; i < M; ++i) {
+        st->lsp_old[i] = fr->lsp_new[i];
+        st->lsp_old_q[i] = fr->lsp_new[i];
+        st->past_rq[i] = 0;
+    }
+    st->sub.T0_prev_subframe = 0;
+    st->sub.sharp = 0;
+
+    vamrnbe_prm2bits(MODE_DTX, prm);
+}

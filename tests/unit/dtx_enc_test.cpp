@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "enc/enc_state.h"
 #include "format/frame_format.h"
 #include "lpc/tables.h"
 #include "vad/dtx_enc.h"
@@ -190,4 +191,103 @@ TEST(DtxSid, EnergyIndexAndSeed) {
     st.log_en_hist[0] = 3;                    // 3 >> 2 = 0
     for (int s = 1; s < 8; ++s) st.log_en_hist[s] = 0;
     EXPECT_EQ(dtx_log_en_index(&st), 2688 >> 8);
+}
+
+// ---- the SID encoder ------------------------------------------------------------
+
+namespace {
+
+struct sid_fixture {
+    vamrnb_encoder enc{};
+    enc_frame fr{};
+    sid_fixture() {
+        dtx_enc_init(&enc.dtx);
+        for (auto &v : enc.old_exc) v = 1;
+        for (auto &v : enc.sub.mem_w0) v = 7;
+        for (auto &v : enc.sub.mem_err) v = 7;
+        for (auto &v : enc.sub.ai_zero) v = 7;
+        for (auto &v : enc.sub.hvec) v = 7;
+        for (auto &v : enc.past_rq) v = 9;
+        for (int i = 0; i < 10; ++i) {
+            enc.lsp_old[i] = enc.lsp_old_q[i] = 1;
+            fr.lsp_new[i] = static_cast<Word16>(30000 - 3000 * i);
+        }
+        for (int i = 0; i < 4; ++i) {
+            enc.sub.pred.past_qua_en[i] = enc.sub.pred_unq.past_qua_en[i] = 123;
+            enc.sub.pred.past_qua_en_MR122[i] = enc.sub.pred_unq.past_qua_en_MR122[i] = 45;
+        }
+        enc.sub.sharp = 5000;
+        enc.sub.T0_prev_subframe = 60;
+        fr.mode = 3;
+        fr.used_mode = 8;
+    }
+    // The five SID parameters read back from the frame's bits.
+    std::vector<int> params() const {
+        const int widths[5] = {3, 8, 9, 9, 6};
+        std::vector<int> out;
+        int pos = 0;
+        for (int w : widths) {
+            int v = 0;
+            for (int b = 0; b < w; ++b) v = 2 * v + fr.prm[pos++];
+            out.push_back(v);
+        }
+        for (int i = pos; i < 244; ++i) EXPECT_EQ(fr.prm[i], 0) << i;
+        return out;
+    }
+};
+
+}  // namespace
+
+// Inside a shortened hangover the stored SID parameters are sent again, but
+// the speech coder is still reset to restart from this frame's spectrum.
+TEST(DtxSid, RepeatedParametersStillResetTheCoder) {
+    sid_fixture f;
+    f.enc.dtx.init_lsf_vq_index = 5;
+    f.enc.dtx.lsp_index[0] = 200;
+    f.enc.dtx.lsp_index[1] = 301;
+    f.enc.dtx.lsp_index[2] = 402;
+    f.enc.dtx.log_en_index = 37;
+    f.fr.compute_sid = 0;
+    vamrnbe_dtx(&f.enc, &f.fr);
+
+    EXPECT_EQ(f.params(), (std::vector<int>{5, 200, 301, 402, 37}));
+    EXPECT_EQ(f.enc.sub.pred.past_qua_en[0], 123);   // no new seed
+
+    for (int i = 0; i < 314; ++i) EXPECT_EQ(f.enc.old_exc[i], i < 154 ? 0 : 1) << i;
+    for (int i = 0; i < 10; ++i) {
+        EXPECT_EQ(f.enc.sub.mem_w0[i], 0);
+        EXPECT_EQ(f.enc.sub.mem_err[i], 0);
+        EXPECT_EQ(f.enc.lsp_old[i], f.fr.lsp_new[i]);
+        EXPECT_EQ(f.enc.lsp_old_q[i], f.fr.lsp_new[i]);
+        EXPECT_EQ(f.enc.past_rq[i], 0);
+    }
+    for (int i = 0; i < 51; ++i) EXPECT_EQ(f.enc.sub.ai_zero[i], i < 11 ? 7 : 0) << i;
+    for (int i = 0; i < 80; ++i) EXPECT_EQ(f.enc.sub.hvec[i], i < 40 ? 0 : 7) << i;
+    EXPECT_EQ(f.enc.sub.sharp, 0);
+    EXPECT_EQ(f.enc.sub.T0_prev_subframe, 0);
+    EXPECT_EQ(f.fr.mode, 3);
+    EXPECT_EQ(f.fr.used_mode, 8);
+}
+
+// A computed SID seeds both histories of the main code-gain predictor from
+// the energy index and leaves the MR475 helper predictor alone.
+TEST(DtxSid, ComputedParametersSeedThePredictor) {
+    sid_fixture f;
+    for (auto &h : f.enc.dtx.log_en_hist) h = 1000;   // index 14
+    f.fr.compute_sid = 1;
+    vamrnbe_dtx(&f.enc, &f.fr);
+
+    const std::vector<int> p = f.params();
+    EXPECT_EQ(p[4], 14);
+    EXPECT_EQ(p[0], f.enc.dtx.init_lsf_vq_index);
+    EXPECT_EQ(p[1], f.enc.dtx.lsp_index[0]);
+    EXPECT_EQ(p[3], f.enc.dtx.lsp_index[2]);
+    for (int i = 0; i < 4; ++i) {
+        EXPECT_EQ(f.enc.sub.pred.past_qua_en[i], 14 * 256 - 11560);
+        EXPECT_EQ(f.enc.sub.pred.past_qua_en_MR122[i], (5443 * (14 * 256 - 11560)) >> 15);
+        EXPECT_EQ(f.enc.sub.pred_unq.past_qua_en[i], 123);
+        EXPECT_EQ(f.enc.sub.pred_unq.past_qua_en_MR122[i], 45);
+    }
+    // The quantiser's memory is cleared afterwards like every other memory.
+    for (int i = 0; i < 10; ++i) EXPECT_EQ(f.enc.past_rq[i], 0);
 }
