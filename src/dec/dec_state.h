@@ -8,6 +8,7 @@
 #include "basic_op/basic_op.h"
 #include "dec/cn_state.h"
 #include "dec/post_state.h"
+#include "lpc/lpc.h"
 
 #if __has_include("format/frame_format.h")
 #include "format/frame_format.h"
@@ -132,23 +133,31 @@ void reset_dec(dec_state *st, int32_t mode);
 }  // namespace vamrnb
 
 extern "C" {
-int32_t vamrnbd_lsp(vamrnb::dec_state *st, vamrnb::dec_work *w, const int16_t **cursor);
-void vamrnbd_lsp_avg(const int16_t past_lsf_q[10], int16_t lsp_meanSave[10]);
-void vamrnbd_acb(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode, int32_t i_subfr,
-                 const int16_t **cursor);
-void vamrnbd_icb(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode, const int16_t **cursor);
-void vamrnbd_dec_gain(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode,
-                      const int16_t **cursor);
-void vamrnbd_excit(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode, int32_t i_subfr);
-void vamrnbd_syn(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t i_subfr);
-int16_t vamrnbd_bgn_scd(vamrnb::dec_state *st, const int16_t ltpGainHistory[9],
-                        const int16_t speech[160], int16_t *voicedHangover);
-void vamrnbd_post_filt(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode);
-int32_t vamrnbd_energy_old(const int16_t in[40]);
-int32_t vamrnbd_energy_new(const int16_t in[40]);
-int32_t vamrnbd_recon(int16_t samples[160], const codec_config *config, pcm_buffer *out);
+VAMRNB_API int32_t vamrnbd_lsp(vamrnb::dec_state *st, vamrnb::dec_work *w, const int16_t **cursor);
+VAMRNB_API void vamrnbd_lsp_avg(const int16_t past_lsf_q[10], int16_t lsp_meanSave[10]);
+VAMRNB_API void vamrnbd_acb(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode,
+                            int32_t i_subfr, const int16_t **cursor);
+VAMRNB_API void vamrnbd_icb(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode,
+                            const int16_t **cursor);
+// The stages below take the frame mode from w->rx.frame_mode.
+VAMRNB_API void vamrnbd_dec_gain(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t i_subfr,
+                                 const int16_t **cursor);
+VAMRNB_API void vamrnbd_excit(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t i_subfr);
+VAMRNB_API void vamrnbd_syn(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t i_subfr);
+VAMRNB_API int16_t vamrnbd_bgn_scd(vamrnb::dec_state *st, const int16_t ltpGainHistory[9],
+                                   const int16_t speech[160], int16_t *voicedHangover);
+VAMRNB_API void vamrnbd_post_filt(vamrnb::dec_state *st, vamrnb::dec_work *w, int32_t mode);
+VAMRNB_API int32_t vamrnbd_energy_old(const int16_t in[40]);
+VAMRNB_API int32_t vamrnbd_energy_new(const int16_t in[40]);
+VAMRNB_API int32_t vamrnbd_recon(int16_t samples[160], const codec_config *config,
+                                 pcm_buffer *out);
 
-// comfort noise (cn)
-void vamrnbd_dtx(vamrnb::dec_state *st, vamrnb::dec_work *w, const int16_t **cursor);
-void vamrnbd_dtx_dec_activity_update(vamrnb::dec_state *st, vamrnb::dec_work *w);
+// Comfort noise: converts the frame's serial bits (w->serial) to w->prm and
+// points *cursor at it, runs the reception DTX state machine (leaving the new
+// state in st->cn.dtxGlobalState) and, in a comfort-noise state, writes the
+// frame's synthesis to dec_synth(w) (updating st->mem_syn) and the four LPC
+// sets for the post-filter to w->Az.
+VAMRNB_API void vamrnbd_dtx(vamrnb::dec_state *st, vamrnb::dec_work *w, const int16_t **cursor);
+// Comfort-noise histories after a frame of decoded speech (dec_synth(w)).
+VAMRNB_API void vamrnbd_dtx_dec_activity_update(vamrnb::dec_state *st, vamrnb::dec_work *w);
 }

@@ -1,0 +1,117 @@
+// Post-filter of the decoder: per subframe a formant post-filter
+// A(z/g1)/A(z/g2) on the synthesised speech with tilt compensation and
+// adaptive gain control, then for the whole frame a 60 Hz high-pass filter
+// that also doubles the signal.
+#include <cstring>
+
+#include "dec/dec_state.h"
+
+#include "basic_op/ext_op.h"
+#include "lpc/lpc.h"
+#include "lpc/tables.h"
+
+using namespace vamrnb;
+
+namespace {
+
+constexpr Word16 MU = 26214;       // tilt compensation factor, 0.8
+constexpr Word16 AGC_FAC = 29491;  // gain control smoothing, 0.9
+constexpr int L_H = 22;            // truncated impulse response length
+
+// Scales the post-filtered subframe so that its energy follows the input's,
+// with a smoothed gain.
+void agc(post_filter_state *st, const Word16 *in, Word16 *out) {
+    Word32 s = vamrnbd_energy_new(out);
+    if (s == 0) {
+        st->past_gain = 0;
+        return;
+    }
+    Word16 exp = sub(norm_l(s), 1);
+    const Word16 gain_out = round16(l_shl(s, exp));
+    Word16 g0 = 0;
+    s = vamrnbd_energy_new(in);
+    if (s != 0) {
+        const Word16 i = norm_l(s);
+        const Word16 gain_in = round16(l_shl(s, i));
+        exp = sub(exp, i);
+        s = l_deposit_l(div_s(gain_out, gain_in));
+        s = l_shr(l_shl(s, 7), exp);
+        s = vamrnb_inv_sqrt(s);
+        g0 = mult(round16(l_shl(s, 9)), sub(32767, AGC_FAC));
+    }
+    Word16 gain = st->past_gain;
+    for (int i = 0; i < L_SUBFR; ++i) {
+        gain = add(mult(gain, AGC_FAC), g0);
+        out[i] = extract_h(l_shl(l_mult(out[i], gain), 3));
+    }
+    st->past_gain = gain;
+}
+
+// Output high-pass filter (second order, 60 Hz) with doubling of the signal.
+void post_process(post_filter_state *st, Word16 *sig) {
+    const Word16 *a = tab::post_pro_a;
+    const Word16 *b = tab::post_pro_b;
+    for (int i = 0; i < L_FRAME; ++i) {
+        const Word16 x2 = st->x1;
+        st->x1 = st->x0;
+        st->x0 = sig[i];
+        Word32 L = mpy_32_16(st->y1_hi, st->y1_lo, a[1]);
+        L = l_add(L, mpy_32_16(st->y2_hi, st->y2_lo, a[2]));
+        L = l_mac(L, st->x0, b[0]);
+        L = l_mac(L, st->x1, b[1]);
+        L = l_mac(L, x2, b[2]);
+        L = l_shl(L, 2);
+        sig[i] = round16(l_shl(L, 1));
+        st->y2_hi = st->y1_hi;
+        st->y2_lo = st->y1_lo;
+        l_extract(L, &st->y1_hi, &st->y1_lo);
+    }
+}
+
+}  // namespace
+
+extern "C" void vamrnbd_post_filt(dec_state *st, dec_work *w, int32_t mode) {
+    post_filter_state *pf = &st->post;
+    Word16 *syn = pf->synth_buf + M;  // input, with 10 past samples before it
+    std::memcpy(syn, dec_synth(w), L_FRAME * sizeof(Word16));
+
+    const bool high = (mode & ~1) == MR102;
+    const Word16 *g_num = high ? tab::gamma3_MR122 : tab::gamma3;
+    const Word16 *g_den = high ? tab::gamma4_MR122 : tab::gamma4;
+
+    const Word16 *Az = w->Az;
+    for (int i_subfr = 0; i_subfr < L_FRAME; i_subfr += L_SUBFR, Az += MP1) {
+        Word16 Ap_num[MP1], Ap_den[MP1];
+        vamrnb_weight_a(Az, g_num, M, Ap_num);
+        vamrnb_weight_a(Az, g_den, M, Ap_den);
+
+        vamrnb_residu(Ap_num, syn + i_subfr, pf->res2);
+
+        // impulse response of the weighted filter pair, for the tilt
+        Word16 h[L_SUBFR] = {};
+        static constexpr Word16 zero_mem[M] = {};
+        std::memcpy(h, Ap_num, sizeof Ap_num);
+        vamrnb_syn_filt(Ap_den, h, zero_mem, h);
+        Word32 L = l_mult(h[0], h[0]);
+        for (int i = 1; i < L_H; ++i) L = l_mac(L, h[i], h[i]);
+        const Word16 r0 = extract_h(L);
+        L = l_mult(h[0], h[1]);
+        for (int i = 1; i < L_H - 1; ++i) L = l_mac(L, h[i], h[i + 1]);
+        Word16 r1 = extract_h(L);
+        r1 = r1 <= 0 ? 0 : div_s(mult(r1, MU), r0);
+
+        // tilt compensation 1 - r1 z^-1, run backwards in place
+        Word16 *res = pf->res2;
+        const Word16 last = res[L_SUBFR - 1];
+        for (int i = L_SUBFR - 1; i > 0; --i) res[i] = sub(res[i], mult(r1, res[i - 1]));
+        res[0] = sub(res[0], mult(r1, pf->mem_pre));
+        pf->mem_pre = last;
+
+        Word16 *out = w->out + i_subfr;
+        vamrnb_syn_filt(Ap_den, res, pf->mem_syn_pst, out);
+        std::memcpy(pf->mem_syn_pst, out + L_SUBFR - M, M * sizeof(Word16));
+        agc(pf, syn + i_subfr, out);
+    }
+    std::memcpy(pf->synth_buf, pf->synth_buf + L_FRAME, M * sizeof(Word16));
+    post_process(pf, w->out);
+}
