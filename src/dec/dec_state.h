@@ -10,16 +10,7 @@
 #include "dec/post_state.h"
 #include "lpc/lpc.h"
 
-#if __has_include("format/frame_format.h")
 #include "format/frame_format.h"
-#else
-// Classification of a received frame; filled by the frame unpacker.
-struct rx_frame_class {
-    int32_t quality;     // Q bit of the table-of-contents byte
-    int32_t frame_mode;  // codec mode (speech, SID) or the raw frame type
-    int32_t rx_type;     // reception frame type RX_*
-};
-#endif
 
 namespace vamrnb {
 
@@ -34,6 +25,7 @@ struct dec_state {
     bgn_scd_state bgn;
 
     Word32 rx_type_last;        // reception type of the last accepted frame
+    vcmn_bsr reader;            // bit-stream reader, set on the input each call
     dec_state *self;            // own address, set when creation succeeded
     codec_config config;        // copy of the caller's configuration
     dec_work *work;             // working record

@@ -1,0 +1,230 @@
+// Decoder stages in isolation: pitch-lag decoding and its concealment, the
+// pitch-gain table and the gain concealment histories, the pulse codebooks,
+// and the LSF average.
+#include <gtest/gtest.h>
+
+#include <cstring>
+#include <memory>
+
+#include "dec/dec_gain.h"
+#include "dec/dec_state.h"
+#include "lpc/tables.h"
+
+using namespace vamrnb;
+
+namespace {
+
+struct Decoder {
+    std::unique_ptr<dec_state> st = std::make_unique<dec_state>();
+    std::unique_ptr<dec_work> w = std::make_unique<dec_work>();
+    Decoder() {
+        std::memset(st.get(), 0, sizeof *st);
+        std::memset(w.get(), 0, sizeof *w);
+        st->work = w.get();
+        reset_dec(st.get(), 0);
+    }
+    // Runs the adaptive codebook on one lag index; returns (T0, frac).
+    std::pair<int, int> lag(int32_t mode, int32_t i_subfr, int16_t index) {
+        const int16_t *cursor = &index;
+        vamrnbd_acb(st.get(), w.get(), mode, i_subfr, &cursor);
+        EXPECT_EQ(cursor, &index + 1);
+        return {w->T0, w->T0_frac};
+    }
+};
+
+TEST(DecoderLag, Mr122AbsoluteCodeBoundary) {
+    Decoder d;
+    EXPECT_EQ(d.lag(MR122, 0, 462), std::make_pair(94, 3));
+    EXPECT_EQ(d.lag(MR122, 0, 463), std::make_pair(95, 0));
+    EXPECT_EQ(d.lag(MR122, 0, 0), std::make_pair(17, 3));    // 17 - 3/6 = 16.5
+    EXPECT_EQ(d.lag(MR122, 80, 511), std::make_pair(143, 0));  // third subframe is absolute too
+}
+
+TEST(DecoderLag, Mr122RelativeCodeAndInvalidIndices) {
+    Decoder d;
+    d.st->old_T0 = 100;  // window starts at 95
+    EXPECT_EQ(d.lag(MR122, 40, 0), std::make_pair(94, 3));   // 95 - 3/6
+    EXPECT_EQ(d.lag(MR122, 40, 3), std::make_pair(95, 0));
+    EXPECT_EQ(d.lag(MR122, 40, 60), std::make_pair(104, 3));
+    const int16_t keep = d.st->T0_lagBuff;
+    EXPECT_EQ(d.lag(MR122, 40, 59), std::make_pair(104, 2));
+    EXPECT_EQ(d.st->T0_lagBuff, keep);  // good lags leave the buffer alone
+    // 61..63 are not valid relative codes: previous lag, decoded one buffered
+    EXPECT_EQ(d.lag(MR122, 120, 61), std::make_pair(100, 0));
+    EXPECT_EQ(d.st->T0_lagBuff, 105);
+    // at the top the window is pinned to 134..143
+    d.st->old_T0 = 143;
+    EXPECT_EQ(d.lag(MR122, 40, 3), std::make_pair(134, 0));
+    d.st->old_T0 = 18;  // and at the bottom to 18..27
+    EXPECT_EQ(d.lag(MR122, 40, 3), std::make_pair(18, 0));
+}
+
+TEST(DecoderLag, ThirdResolutionCodes) {
+    Decoder d;
+    EXPECT_EQ(d.lag(MR74, 0, 196), std::make_pair(85, -1));
+    EXPECT_EQ(d.lag(MR74, 0, 197), std::make_pair(85, 0));
+    d.st->old_T0 = 60;  // 5-bit code, window 55..64
+    EXPECT_EQ(d.lag(MR74, 40, 2), std::make_pair(55, 0));
+    EXPECT_EQ(d.lag(MR74, 40, 31), std::make_pair(65, -1));
+    d.st->old_T0 = 60;  // MR795 uses a wider window, 50..69
+    EXPECT_EQ(d.lag(MR795, 40, 2), std::make_pair(50, 0));
+    // 4-bit code: whole lags below, thirds around, whole lags above
+    d.st->old_T0 = 60;
+    EXPECT_EQ(d.lag(MR59, 40, 0), std::make_pair(55, 0));
+    EXPECT_EQ(d.lag(MR59, 40, 4), std::make_pair(58, 1));
+    EXPECT_EQ(d.lag(MR59, 40, 8), std::make_pair(60, -1));
+    EXPECT_EQ(d.lag(MR59, 40, 15), std::make_pair(64, 0));
+    // MR475/MR515 code the third subframe relatively, higher modes absolutely
+    d.st->old_T0 = 60;
+    EXPECT_EQ(d.lag(MR515, 80, 8), std::make_pair(60, -1));
+    EXPECT_EQ(d.lag(MR59, 80, 8), std::make_pair(22, 0));
+}
+
+TEST(DecoderLag, BadFramesGrowOldLagUpToMaximum) {
+    Decoder d;
+    d.w->bfi = 1;
+    d.st->old_T0 = 141;
+    for (int expect : {142, 143, 143, 143}) {
+        auto [T0, frac] = d.lag(MR475, 40, 5);
+        EXPECT_EQ(T0, expect);
+        EXPECT_EQ(frac, 0);
+        EXPECT_EQ(d.st->old_T0, expect);
+        d.st->old_T0 = static_cast<Word16>(T0);  // as the synthesis step does
+    }
+    // the received lag is still buffered, good frame or bad
+    EXPECT_NE(d.st->T0_lagBuff, 143);
+}
+
+TEST(DecoderLag, BadFrameInBackgroundNoiseUsesReceivedLagInLowModes) {
+    Decoder d;
+    d.w->bfi = 1;
+    d.st->inBackgroundNoise = 1;
+    d.st->voicedHangover = 5;
+    d.st->old_T0 = 60;
+    EXPECT_EQ(d.lag(MR59, 0, 100).first, 53);  // decoded lag of index 100
+    d.st->old_T0 = 60;
+    EXPECT_EQ(d.lag(MR67, 0, 100).first, 61);  // MR67 grows the old lag
+    d.st->old_T0 = 60;
+    d.st->voicedHangover = 4;
+    EXPECT_EQ(d.lag(MR475, 0, 100).first, 61);
+}
+
+TEST(DecoderGain, PitchGainTable) {
+    EXPECT_EQ(vamrnbd_d_gain_pitch(MR122, 15), 19660);
+    EXPECT_EQ(vamrnbd_d_gain_pitch(MR795, 15), 19661);
+    EXPECT_EQ(vamrnbd_d_gain_pitch(MR122, 1), 3276);
+    EXPECT_EQ(vamrnbd_d_gain_pitch(MR122, 0), 0);
+}
+
+TEST(DecoderGain, PitchHistoryIsClampedAndLimitedAfterBadFrame) {
+    Decoder d;
+    int16_t g = 19661;
+    vamrnbd_ec_gain_pitch_update(d.st.get(), 0, 0, &g);
+    EXPECT_EQ(g, 19661);  // the gain itself is not clamped
+    EXPECT_EQ(d.st->prev_gp, 19661);
+    EXPECT_EQ(d.st->past_gain_pit, 16384);
+    EXPECT_EQ(d.st->pbuf[4], 16384);
+    EXPECT_EQ(d.st->pbuf[3], 1640);
+
+    // a bad frame does not change the last good gain
+    g = 100;
+    vamrnbd_ec_gain_pitch_update(d.st.get(), 1, 0, &g);
+    EXPECT_EQ(d.st->prev_gp, 19661);
+    EXPECT_EQ(d.st->past_gain_pit, 100);
+    // the first good frame after a bad one is held to the last good gain
+    d.st->prev_gp = 8000;
+    g = 9000;
+    vamrnbd_ec_gain_pitch_update(d.st.get(), 0, 1, &g);
+    EXPECT_EQ(g, 8000);
+    g = 7000;
+    vamrnbd_ec_gain_pitch_update(d.st.get(), 0, 1, &g);
+    EXPECT_EQ(g, 7000);
+}
+
+TEST(DecoderGain, ConcealedPitchGainIsAttenuatedMedian) {
+    const int16_t hist[5] = {9000, 12000, 3000, 15000, 10000};  // median 10000
+    int16_t g;
+    vamrnbd_ec_gain_pitch(16384, 0, hist, &g);
+    EXPECT_EQ(g, 9999);  // times 32767/32768
+    vamrnbd_ec_gain_pitch(5000, 4, hist, &g);
+    EXPECT_EQ(g, (5000 * 9830) >> 15);  // last gain is smaller than the median
+    vamrnbd_ec_gain_pitch(16384, 6, hist, &g);
+    EXPECT_EQ(g, (10000 * 6553) >> 15);
+}
+
+TEST(DecoderGain, ConcealedCodeGainAgesPredictorWithFloor) {
+    Decoder d;
+    for (int i = 0; i < 5; ++i) d.st->gbuf[i] = static_cast<Word16>(100 * (i + 1));
+    d.st->past_gain_code = 250;
+    d.st->conceal_state = 6;
+    const Word16 hist122[4] = {-1000, -2000, -3000, -4000};  // mean -2500, floored
+    const Word16 hist[4] = {-8000, -8000, -8000, -8004};     // mean -8001
+    std::memcpy(d.st->past_qua_en_MR122, hist122, sizeof hist122);
+    std::memcpy(d.st->past_qua_en, hist, sizeof hist);
+    Word16 g;
+    ec_gain_code(d.st.get(), &g);
+    EXPECT_EQ(g, (250 * 22937) >> 15);
+    EXPECT_EQ(d.st->past_qua_en_MR122[0], -2381);
+    EXPECT_EQ(d.st->past_qua_en_MR122[1], -1000);
+    EXPECT_EQ(d.st->past_qua_en[0], -8001);
+    EXPECT_EQ(d.st->past_qua_en[3], -8000);
+}
+
+TEST(DecoderCodebook, PulseVectors) {
+    Decoder d;
+    d.w->T0 = 40;  // no pitch sharpening
+    auto nonzero = [&] {
+        std::vector<std::pair<int, int>> v;
+        for (int i = 0; i < 40; ++i)
+            if (d.w->code[i] != 0) v.emplace_back(i, d.w->code[i]);
+        return v;
+    };
+    using V = std::vector<std::pair<int, int>>;
+    // 9-bit code: positions from the start table of subframe 1, set j = 1
+    int16_t p9[2] = {64 + (3 << 3) + 2, 1};
+    const int16_t *c = p9;
+    d.w->subfr_nr = 1;
+    vamrnbd_icb(d.st.get(), d.w.get(), MR475, &c);
+    EXPECT_EQ(c, p9 + 2);
+    EXPECT_EQ(nonzero(), (V{{2 * 5 + 2, 8191}, {3 * 5 + 4, -8192}}));
+
+    // MR122: pitch-gain index first, then ten pulse words; two pulses on one
+    // position of a track add up
+    int16_t p122[11] = {};
+    p122[1] = 8 | 1;  // track 0 at 5 * dgray[1], negative
+    p122[6] = 1;      // second pulse of track 0 at the same place
+    c = p122;
+    vamrnbd_icb(d.st.get(), d.w.get(), MR122, &c);
+    EXPECT_EQ(c, p122 + 11);
+    EXPECT_EQ(d.w->gain_pit, 0);
+    EXPECT_EQ(nonzero(), (V{{1, 8192}, {2, 8192}, {3, 8192}, {4, 8192},
+                            {5 * tab::dgray[1], -8192}}));
+}
+
+TEST(DecoderCodebook, PitchSharpeningAddsDelayedPulses) {
+    Decoder d;
+    d.w->T0 = 20;
+    d.st->sharp = 8192;  // factor 0.5 after doubling
+    int16_t p[2] = {0, 3};  // MR59: pulses at 1 and 0, both positive
+    const int16_t *c = p;
+    vamrnbd_icb(d.st.get(), d.w.get(), MR59, &c);
+    EXPECT_EQ(d.w->code[0], 8191);
+    EXPECT_EQ(d.w->code[1], 8191);
+    EXPECT_EQ(d.w->code[20], 4095);
+    EXPECT_EQ(d.w->code[21], 4095);
+}
+
+TEST(DecoderLsf, AverageMovesSixteenPercent) {
+    int16_t mean[10], cur[10];
+    for (int i = 0; i < 10; ++i) {
+        mean[i] = static_cast<int16_t>(1000 * (i + 1));
+        cur[i] = static_cast<int16_t>(1000 * (i + 1) + 100 * (i - 5));
+    }
+    int16_t expect[10];
+    for (int i = 0; i < 10; ++i)
+        expect[i] = static_cast<int16_t>((mean[i] * 55050 + cur[i] * 10486 + 32768) >> 16);
+    vamrnbd_lsp_avg(cur, mean);
+    for (int i = 0; i < 10; ++i) EXPECT_EQ(mean[i], expect[i]) << i;
+}
+
+}  // namespace
