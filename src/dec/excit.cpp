@@ -18,6 +18,13 @@ constexpr Word16 PHD_THR2 = 14746;  // 0.9 in Q14
 
 inline bool low_mode(int32_t mode) { return mode == MR475 || mode == MR515 || mode == MR59; }
 
+// Q15 quotient num / den; for 0 <= num < den it is floor(num * 2^15 / den),
+// which is what the bit-serial division produces.
+inline Word16 div_q15(Word16 num, Word16 den) {
+    if (num >= 0 && num < den) return static_cast<Word16>((static_cast<int32_t>(num) << 15) / den);
+    return div_s(num, den);
+}
+
 // Energy of a 40-sample vector with the input scaled down by 4.
 Word32 energy_scaled(const Word16 *x) {
     Word16 t = shr(x[0], 2);
@@ -46,7 +53,7 @@ Word16 cb_gain_average(dec_state *st, int32_t mode, Word16 gain_code, const Word
         const Word16 s1 = sub(norm_s(d), 1);
         d = shl(d, s1);
         const Word16 s2 = norm_s(mean);
-        Word16 q = div_s(d, shl(mean, s2));
+        Word16 q = div_q15(d, shl(mean, s2));
         const Word16 s = sub(add(2, s1), s2);
         q = s >= 0 ? shr(q, s) : shl(q, negate(s));
         diff = i == 0 ? q : add(diff, q);

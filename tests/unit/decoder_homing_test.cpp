@@ -1,0 +1,140 @@
+// Decoder homing through the frame driver: homing frames are answered with
+// the encoder homing pattern while the decoder is in its initial state,
+// decoded normally otherwise and then reset the decoder; only the first
+// subframe's parameters count while homed.  Every output sample is 13-bit.
+#include <gtest/gtest.h>
+
+#include <array>
+#include <cstring>
+#include <random>
+#include <vector>
+
+#include "format/frame_tables.h"
+#include "vamrnb.h"
+
+namespace {
+
+using Frame = std::vector<uint8_t>;
+using Pcm = std::array<int16_t, 160>;
+
+// Storage-format frame of speech mode `mode` carrying the parameters prm.
+Frame pack(int mode, const int16_t *prm) {
+    int16_t serial[250] = {};
+    int n = 0;
+    for (int j = 0; j < vamrnb_tbl_prmno[mode]; ++j)
+        for (int b = vamrnb_tbl_bitno[mode][j] - 1; b >= 0; --b) serial[n++] = (prm[j] >> b) & 1;
+    Frame f(vamrnb_tbl_packed_size[mode], 0);
+    f[0] = static_cast<uint8_t>(mode << 3 | 4);
+    for (int i = 0; i < vamrnb_tbl_unpacked_size[mode]; ++i)
+        if (serial[vamrnb_tbl_sort_ptr[mode][i]]) f[1 + i / 8] |= static_cast<uint8_t>(0x80 >> (i % 8));
+    return f;
+}
+
+Frame homing(int mode) { return pack(mode, vamrnb::tab::homing_frame_params[mode]); }
+
+Frame random_speech(int mode, std::mt19937 &rng) {
+    Frame f(vamrnb_tbl_packed_size[mode]);
+    for (auto &b : f) b = static_cast<uint8_t>(rng());
+    f[0] = static_cast<uint8_t>(mode << 3 | 4);
+    return f;
+}
+
+struct Decoder {
+    vamrnb_decoder *d;
+    Decoder() {
+        codec_config c{};
+        c.dec.layout = 1;
+        c.dec.channels = 1;
+        d = vamrnbd_create(&c, nullptr);
+    }
+    ~Decoder() { vamrnbd_delete(d); }
+    Pcm run(Frame f) {
+        Pcm pcm;
+        pcm_buffer out{};
+        out.data[0] = pcm.data();
+        frame_info info{};
+        bitstream_buffer in{};
+        in.data = f.data();
+        in.size = static_cast<uint32_t>(f.size());
+        EXPECT_EQ(vamrnbd_decode(d, &in, &out, &info), 0);
+        EXPECT_EQ(info.bytes, f.size());
+        for (int16_t s : pcm) EXPECT_EQ(s & 7, 0);
+        return pcm;
+    }
+};
+
+bool is_homing_answer(const Pcm &p) {
+    for (int16_t s : p)
+        if (s != 0x0008) return false;
+    return true;
+}
+
+TEST(DecoderHoming, AnsweredWhileHomedInEveryMode) {
+    std::mt19937 rng(7);
+    for (int mode = 0; mode < 8; ++mode) {
+        Decoder a, fresh;
+        EXPECT_TRUE(is_homing_answer(a.run(homing(mode)))) << mode;
+        EXPECT_TRUE(is_homing_answer(a.run(homing(mode)))) << mode;
+        // speech after the homing frames starts from the initial state
+        for (int k = 0; k < 3; ++k) {
+            const Frame f = random_speech(mode, rng);
+            EXPECT_EQ(a.run(f), fresh.run(f)) << mode;
+        }
+    }
+}
+
+TEST(DecoderHoming, MidStreamHomingFrameIsDecodedThenResets) {
+    std::mt19937 rng(11);
+    for (int mode : {MR475, MR795, MR122}) {
+        Decoder a, fresh;
+        for (int k = 0; k < 5; ++k) a.run(random_speech(mode, rng));
+        const Pcm h = a.run(homing(mode));
+        EXPECT_FALSE(is_homing_answer(h));
+        // after the reset the decoder is homed again ...
+        EXPECT_TRUE(is_homing_answer(a.run(homing(mode))));
+        // ... and its speech equals a fresh decoder's
+        for (int k = 0; k < 4; ++k) {
+            const Frame f = random_speech(mode, rng);
+            EXPECT_EQ(a.run(f), fresh.run(f));
+        }
+    }
+}
+
+TEST(DecoderHoming, OnlyFirstSubframeCountsWhileHomed) {
+    // MR122: parameters up to the first subframe (18 of them) match, the rest
+    // not.  While homed this is answered; otherwise it is ordinary speech
+    // that does not reset the decoder.
+    int16_t prm[57];
+    std::memcpy(prm, vamrnb::tab::homing_frame_params[MR122], sizeof prm);
+    prm[18] ^= 1;
+    const Frame partial = pack(MR122, prm);
+
+    Decoder homed;
+    EXPECT_TRUE(is_homing_answer(homed.run(partial)));
+
+    std::mt19937 rng(3);
+    Decoder a, b;
+    const Frame s = random_speech(MR122, rng);
+    a.run(s);
+    b.run(s);
+    EXPECT_FALSE(is_homing_answer(a.run(partial)));
+    b.run(partial);
+    const Frame t = random_speech(MR122, rng);
+    const Pcm pa = a.run(t);
+    EXPECT_EQ(pa, b.run(t));
+    Decoder fresh;
+    EXPECT_NE(pa, fresh.run(t));  // no reset happened
+}
+
+TEST(DecoderHoming, LostFrameWhileHomedIsDecoded) {
+    // a no-data frame carries no parameters to test: it is decoded, and the
+    // decoder is no longer homed afterwards
+    Decoder a;
+    const Pcm lost = a.run(Frame{0x7C});
+    EXPECT_FALSE(is_homing_answer(lost));
+    const Pcm h = a.run(homing(MR475));
+    EXPECT_FALSE(is_homing_answer(h));
+    EXPECT_TRUE(is_homing_answer(a.run(homing(MR475))));
+}
+
+}  // namespace
