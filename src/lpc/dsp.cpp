@@ -14,10 +14,41 @@ constexpr DspKernels kScalar = {
     syn_filt_c, syn_filt_m_c, residu_c, pred_lt_3or6_c, energy_c, inner_product_c,
 };
 
+#if defined(VAMRNB_DSP_X86)
+constexpr DspKernels kSse41 = {
+    syn_filt_sse41, syn_filt_m_sse41, residu_sse41, pred_lt_3or6_sse41, energy_sse41,
+    inner_product_sse41,
+};
+constexpr DspKernels kSse41Avx2 = {
+    syn_filt_sse41, syn_filt_m_sse41, residu_avx2, pred_lt_3or6_avx2, energy_sse41,
+    inner_product_sse41,
+};
+// AVX2 allowed while SSE4.1 is masked off: only the AVX2 kernels.
+constexpr DspKernels kAvx2Only = {
+    syn_filt_c, syn_filt_m_c, residu_avx2, pred_lt_3or6_avx2, energy_c, inner_product_c,
+};
+#endif
+
+#if defined(VAMRNB_DSP_NEON)
+constexpr DspKernels kNeon = {
+    syn_filt_neon, syn_filt_m_neon, residu_neon, pred_lt_3or6_neon, energy_neon,
+    inner_product_neon,
+};
+#endif
+
 std::atomic<uint32_t> g_mask{~0u};
 std::atomic<const DspKernels *> g_active{nullptr};
 
 const DspKernels *select(uint32_t flags) {
+#if defined(VAMRNB_DSP_X86)
+    const bool sse41 = flags & kCpuSse41, avx2 = flags & kCpuAvx2;
+    if (sse41 && avx2) return &kSse41Avx2;
+    if (sse41) return &kSse41;
+    if (avx2) return &kAvx2Only;
+#endif
+#if defined(VAMRNB_DSP_NEON)
+    if (flags & kCpuNeon) return &kNeon;
+#endif
     (void)flags;
     return &kScalar;
 }
@@ -26,6 +57,14 @@ const DspKernels *select(uint32_t flags) {
 
 uint32_t cpu_detect() {
     uint32_t f = 0;
+#if defined(VAMRNB_DSP_X86)
+    __builtin_cpu_init();
+    if (__builtin_cpu_supports("sse4.1")) f |= kCpuSse41;
+    if (__builtin_cpu_supports("avx2")) f |= kCpuAvx2;
+#endif
+#if defined(VAMRNB_DSP_NEON)
+    f |= kCpuNeon;   // the build itself requires NEON
+#endif
     return f;
 }
 

@@ -9,6 +9,7 @@
 // test and wrap to -32768 in the rounding; that is intended.
 #include "lpc/dsp.h"
 #include "lpc/lpc.h"
+#include "lpc/syn_core.h"
 
 namespace vamrnb {
 namespace {
@@ -20,39 +21,18 @@ inline Word32 syn_sum(const Word16 *a, Word16 x, const Word16 *yn) {
     return s;
 }
 
-inline Word16 syn_round(Word32 s) { return wrap16(wrap_add(wrap_shl(s, 4), 0x8000) >> 16); }
-
 }  // namespace
 
 void syn_filt_c(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y) {
     Word16 buf[M + L_SUBFR];
     for (int i = 0; i < M; ++i) buf[i] = mem[i];
-    for (int n = 0; n < L_SUBFR; ++n) {
-        const Word32 s = syn_sum(a, x[n], &buf[M + n]);
-        Word16 out;
-        if (s > 0x07FFFFFF) out = MAX_16;
-        else if (s < -0x08000000) out = MIN_16;
-        else out = syn_round(s);
-        buf[M + n] = out;
-    }
+    for (int n = 0; n < L_SUBFR; ++n) buf[M + n] = syn::Plain::out(syn_sum(a, x[n], &buf[M + n]), nullptr);
     for (int n = 0; n < L_SUBFR; ++n) y[n] = buf[M + n];
 }
 
 void syn_filt_m_c(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf) {
-    for (int n = 0; n < L_SUBFR; ++n) {
-        const Word32 s = syn_sum(a, x[n], &buf[M + n]);
-        Word16 out;
-        if (s >= 0x07FFFFFF) {
-            out = MAX_16;
-            *overflow = 1;
-        } else if (s <= -0x07FFFFFF) {
-            out = MIN_16;
-            *overflow = 1;
-        } else {
-            out = syn_round(s);
-        }
-        buf[M + n] = out;
-    }
+    for (int n = 0; n < L_SUBFR; ++n)
+        buf[M + n] = syn::Flagged::out(syn_sum(a, x[n], &buf[M + n]), overflow);
 }
 
 }  // namespace vamrnb

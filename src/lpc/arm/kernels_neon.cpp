@@ -1,0 +1,162 @@
+// NEON versions of the subframe kernels.  The saturating doubling
+// multiply-accumulate (vqdmlal), saturating shift (vqshl) and rounding
+// saturating narrow (vqrshrn) are exactly the fixed-point steps of the
+// portable versions, lane by lane; four lanes carry four output samples.
+// Built only for ARM targets with NEON (the 32-bit ARM build requires it).
+#include "lpc/dsp.h"
+
+#if defined(VAMRNB_DSP_NEON)
+
+#include <arm_neon.h>
+
+#include "lpc/lpc.h"
+#include "lpc/syn_core.h"
+#include "lpc/tables.h"
+
+namespace vamrnb {
+namespace {
+
+// Synthesis, four outputs per step (see the SSE4.1 version): the vector
+// forms each lane's sum over outputs of earlier steps, the remaining taps
+// are added lane by lane in order.
+template <class Rule>
+inline void syn_run(const Word16 *a, const Word16 *x, Word16 *buf, Word32 *overflow) {
+    int32x4_t coef[M + 1];
+    for (int i = 1; i <= M; ++i) {
+        const int32_t c[4] = {a[i], i > 1 ? a[i] : 0, i > 2 ? a[i] : 0, i > 3 ? a[i] : 0};
+        coef[i] = vld1q_s32(c);
+    }
+    const int32x4_t a0 = vdupq_n_s32(a[0]);
+    for (int n = 0; n < L_SUBFR; n += 4) {
+        Word16 *y = buf + M + n;
+        int32x4_t s = vmulq_s32(a0, vmovl_s16(vld1_s16(x + n)));
+        for (int i = 1; i <= M; ++i) s = vmlsq_s32(s, coef[i], vmovl_s16(vld1_s16(y - i)));
+        int32_t p[4];
+        vst1q_s32(p, s);
+        y[0] = Rule::out(p[0], overflow);
+        y[1] = Rule::out(wrap_sub(p[1], wrap_mul(a[1], y[0])), overflow);
+        y[2] = Rule::out(wrap_sub(p[2], wrap_add(wrap_mul(a[1], y[1]), wrap_mul(a[2], y[0]))), overflow);
+        y[3] = Rule::out(wrap_sub(p[3], wrap_add(wrap_add(wrap_mul(a[1], y[2]), wrap_mul(a[2], y[1])),
+                                                 wrap_mul(a[3], y[0]))),
+                         overflow);
+    }
+}
+
+}  // namespace
+
+void syn_filt_neon(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y) {
+    Word16 buf[M + L_SUBFR + 6] = {};
+    for (int i = 0; i < M; ++i) buf[i] = mem[i];
+    syn_run<syn::Plain>(a, x, buf, nullptr);
+    for (int n = 0; n < L_SUBFR; ++n) y[n] = buf[M + n];
+}
+
+void syn_filt_m_neon(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *out) {
+    Word16 buf[M + L_SUBFR + 6] = {};
+    for (int i = 0; i < M; ++i) buf[i] = out[i];
+    syn_run<syn::Flagged>(a, x, buf, overflow);
+    for (int n = 0; n < L_SUBFR; ++n) out[M + n] = buf[M + n];
+}
+
+void residu_neon(const Word16 *a, const Word16 *x, Word16 *y) {
+    for (int n = 0; n < L_SUBFR; n += 8) {
+        int32x4_t lo = vqdmull_n_s16(vld1_s16(x + n), a[0]);
+        int32x4_t hi = vqdmull_n_s16(vld1_s16(x + n + 4), a[0]);
+        for (int i = 1; i <= M; ++i) {
+            lo = vqdmlal_n_s16(lo, vld1_s16(x + n - i), a[i]);
+            hi = vqdmlal_n_s16(hi, vld1_s16(x + n + 4 - i), a[i]);
+        }
+        lo = vqshlq_n_s32(lo, 3);
+        hi = vqshlq_n_s32(hi, 3);
+        vst1q_s16(y + n, vcombine_s16(vqrshrn_n_s32(lo, 16), vqrshrn_n_s32(hi, 16)));
+    }
+}
+
+void pred_lt_3or6_neon(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
+    // Eight outputs per step need a delay of at least 18, four need 14.
+    if (T0 < 14) {
+        pred_lt_3or6_c(T0, frac, flag3, exc);
+        return;
+    }
+    Word32 f = -frac;
+    if (flag3 != 0) f *= 2;
+    const Word16 *x0 = exc - T0;
+    if (f < 0) {
+        f += 6;
+        --x0;
+    }
+    Word16 c1[10], c2[10];
+    for (int i = 0; i < 10; ++i) {
+        c1[i] = vamrnb_tbl_pred_inter_6[f + 6 * i];
+        c2[i] = vamrnb_tbl_pred_inter_6[6 - f + 6 * i];
+    }
+    const int step = T0 >= 18 ? 8 : 4;
+    for (int j = 0; j < L_SUBFR; j += step) {
+        int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
+        for (int i = 0; i < 10; ++i) {
+            lo = vqdmlal_n_s16(lo, vld1_s16(x0 + j - i), c1[i]);
+            lo = vqdmlal_n_s16(lo, vld1_s16(x0 + j + 1 + i), c2[i]);
+            if (step == 8) {
+                hi = vqdmlal_n_s16(hi, vld1_s16(x0 + j + 4 - i), c1[i]);
+                hi = vqdmlal_n_s16(hi, vld1_s16(x0 + j + 5 + i), c2[i]);
+            }
+        }
+        vst1_s16(exc + j, vqrshrn_n_s32(lo, 16));
+        if (step == 8) vst1_s16(exc + j + 4, vqrshrn_n_s32(hi, 16));
+    }
+}
+
+Word32 energy_neon(const Word16 *x, Word32 n, Word32 init) {
+    int32x4_t lo = vsetq_lane_s32(init, vdupq_n_s32(0), 0), hi = vdupq_n_s32(0);
+    const Word32 steps = n <= 0 ? 1 : (n + 7) / 8;
+    for (Word32 s = 0; s < steps; ++s, x += 8) {
+        const int16x4_t a = vld1_s16(x), b = vld1_s16(x + 4);
+        lo = vqdmlal_s16(lo, a, a);
+        hi = vqdmlal_s16(hi, b, b);
+    }
+    const int32x4_t c = vqaddq_s32(lo, hi);                          // lanes k + k+4
+    const int32x2_t d = vqadd_s32(vget_low_s32(c), vget_high_s32(c));  // 0+2, 1+3
+    return vget_lane_s32(vqadd_s32(d, vrev64_s32(d)), 0);
+}
+
+// Exact sum when nothing can saturate (see the SSE4.1 version), otherwise
+// the portable sequential version.
+Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init) {
+    if (n <= 0) return init;
+    const Word32 n8 = n & ~7;
+    uint16x8_t mx = vdupq_n_u16(0), my = vdupq_n_u16(0);
+    int32x4_t acc = vdupq_n_s32(0);
+    for (Word32 i = 0; i < n8; i += 8) {
+        const int16x8_t a = vld1q_s16(x + i), b = vld1q_s16(y + i);
+        mx = vmaxq_u16(mx, vreinterpretq_u16_s16(vabsq_s16(a)));
+        my = vmaxq_u16(my, vreinterpretq_u16_s16(vabsq_s16(b)));
+        acc = vmlal_s16(acc, vget_low_s16(a), vget_low_s16(b));
+        acc = vmlal_s16(acc, vget_high_s16(a), vget_high_s16(b));
+    }
+    uint16_t ax[8], ay[8];
+    int32_t sums[4];
+    vst1q_u16(ax, mx);
+    vst1q_u16(ay, my);
+    vst1q_s32(sums, acc);
+    int64_t max_x = 0, max_y = 0;
+    for (int k = 0; k < 8; ++k) {
+        max_x = ax[k] > max_x ? ax[k] : max_x;
+        max_y = ay[k] > max_y ? ay[k] : max_y;
+    }
+    int64_t tail = 0;
+    for (Word32 i = n8; i < n; ++i) {
+        const int64_t px = x[i] < 0 ? -int64_t{x[i]} : x[i];
+        const int64_t py = y[i] < 0 ? -int64_t{y[i]} : y[i];
+        max_x = px > max_x ? px : max_x;
+        max_y = py > max_y ? py : max_y;
+        tail += int64_t{x[i]} * y[i];
+    }
+    const int64_t abs_init = init < 0 ? -int64_t{init} : init;
+    if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return inner_product_c(x, y, n, init);
+    const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
+    return static_cast<Word32>(init + 2 * total);
+}
+
+}  // namespace vamrnb
+
+#endif  // VAMRNB_DSP_NEON

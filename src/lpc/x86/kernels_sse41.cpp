@@ -1,0 +1,191 @@
+// SSE4.1 versions of the subframe kernels.  Four 32-bit lanes carry four
+// output samples; the saturating 32-bit steps of the portable versions are
+// rebuilt lane by lane (SSE has no saturating 32-bit add), so every result is
+// bit for bit the portable one.  Compiled for any x86 target: the functions
+// carry their own target attribute and are only called when the processor
+// reports SSE4.1.
+#include "lpc/dsp.h"
+
+#if defined(VAMRNB_DSP_X86)
+
+#include <immintrin.h>
+
+#include "lpc/lpc.h"
+#include "lpc/syn_core.h"
+#include "lpc/tables.h"
+
+#define VAMRNB_SSE41 __attribute__((target("sse4.1")))
+
+namespace vamrnb {
+namespace {
+
+// Saturating 32-bit add per lane.
+VAMRNB_SSE41 inline __m128i sat_add(__m128i a, __m128i b) {
+    const __m128i s = _mm_add_epi32(a, b);
+    const __m128i ovf = _mm_and_si128(_mm_xor_si128(s, a), _mm_xor_si128(s, b));
+    const __m128i rail = _mm_xor_si128(_mm_srai_epi32(a, 31), _mm_set1_epi32(0x7fffffff));
+    return _mm_castps_si128(_mm_blendv_ps(_mm_castsi128_ps(s), _mm_castsi128_ps(rail),
+                                          _mm_castsi128_ps(ovf)));
+}
+
+// 2·a·b with the one saturating case (-32768·-32768), from 16-bit lanes
+// already widened to 32 bits.
+VAMRNB_SSE41 inline __m128i dmul(__m128i a32, __m128i b32) {
+    const __m128i p = _mm_mullo_epi32(a32, b32);
+    const __m128i sat = _mm_cmpeq_epi32(p, _mm_set1_epi32(0x40000000));
+    return _mm_xor_si128(_mm_add_epi32(p, p), sat);
+}
+
+VAMRNB_SSE41 inline __m128i load4(const Word16 *p) {
+    return _mm_cvtepi16_epi32(_mm_loadl_epi64(reinterpret_cast<const __m128i *>(p)));
+}
+
+// round16 of four lanes, stored as four Word16.
+VAMRNB_SSE41 inline void store_round4(Word16 *p, __m128i s) {
+    const __m128i r = _mm_srai_epi32(sat_add(s, _mm_set1_epi32(0x8000)), 16);
+    _mm_storel_epi64(reinterpret_cast<__m128i *>(p), _mm_packs_epi32(r, r));
+}
+
+// Synthesis, four outputs per step: the part of each lane's sum that uses
+// outputs of earlier steps is formed in the vector (coefficients masked to
+// zero where a lane would need an output of its own step), the rest is
+// completed lane by lane in order.
+template <class Rule>
+VAMRNB_SSE41 inline void syn_run(const Word16 *a, const Word16 *x, Word16 *buf, Word32 *overflow) {
+    __m128i coef[M + 1];
+    for (int i = 1; i <= M; ++i)
+        coef[i] = _mm_setr_epi32(a[i], i > 1 ? a[i] : 0, i > 2 ? a[i] : 0, i > 3 ? a[i] : 0);
+    const __m128i a0 = _mm_set1_epi32(a[0]);
+    for (int n = 0; n < L_SUBFR; n += 4) {
+        Word16 *y = buf + M + n;
+        __m128i s = _mm_mullo_epi32(a0, load4(x + n));
+        for (int i = 1; i <= M; ++i) s = _mm_sub_epi32(s, _mm_mullo_epi32(coef[i], load4(y - i)));
+        alignas(16) Word32 p[4];
+        _mm_store_si128(reinterpret_cast<__m128i *>(p), s);
+        y[0] = Rule::out(p[0], overflow);
+        y[1] = Rule::out(wrap_sub(p[1], wrap_mul(a[1], y[0])), overflow);
+        y[2] = Rule::out(wrap_sub(p[2], wrap_add(wrap_mul(a[1], y[1]), wrap_mul(a[2], y[0]))), overflow);
+        y[3] = Rule::out(wrap_sub(p[3], wrap_add(wrap_add(wrap_mul(a[1], y[2]), wrap_mul(a[2], y[1])),
+                                                 wrap_mul(a[3], y[0]))),
+                         overflow);
+    }
+}
+
+}  // namespace
+
+VAMRNB_SSE41 void syn_filt_sse41(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y) {
+    // Work buffer with the not yet written outputs zeroed: the masked lanes
+    // read them, multiplied by zero.
+    alignas(16) Word16 buf[M + L_SUBFR + 6] = {};
+    for (int i = 0; i < M; ++i) buf[i] = mem[i];
+    syn_run<syn::Plain>(a, x, buf, nullptr);
+    for (int n = 0; n < L_SUBFR; ++n) y[n] = buf[M + n];
+}
+
+VAMRNB_SSE41 void syn_filt_m_sse41(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *out) {
+    alignas(16) Word16 buf[M + L_SUBFR + 6] = {};
+    for (int i = 0; i < M; ++i) buf[i] = out[i];
+    syn_run<syn::Flagged>(a, x, buf, overflow);
+    for (int n = 0; n < L_SUBFR; ++n) out[M + n] = buf[M + n];
+}
+
+VAMRNB_SSE41 void residu_sse41(const Word16 *a, const Word16 *x, Word16 *y) {
+    __m128i coef[M + 1];
+    for (int i = 0; i <= M; ++i) coef[i] = _mm_set1_epi32(a[i]);
+    const __m128i hi = _mm_set1_epi32(0x0FFFFFFF), lo = _mm_set1_epi32(-0x10000000);
+    for (int n = 0; n < L_SUBFR; n += 4) {
+        __m128i s = dmul(load4(x + n), coef[0]);
+        for (int i = 1; i <= M; ++i) s = sat_add(s, dmul(coef[i], load4(x + n - i)));
+        // Saturating shift left by 3.
+        __m128i r = _mm_slli_epi32(s, 3);
+        r = _mm_blendv_epi8(r, _mm_set1_epi32(0x7fffffff), _mm_cmpgt_epi32(s, hi));
+        r = _mm_blendv_epi8(r, _mm_set1_epi32(static_cast<int>(0x80000000u)), _mm_cmplt_epi32(s, lo));
+        store_round4(y + n, r);
+    }
+}
+
+VAMRNB_SSE41 void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
+    // Four outputs at a time read nothing of their own step only when the
+    // delay leaves at least four samples between the newest read and the
+    // first output of the step.
+    if (T0 < 14) {
+        pred_lt_3or6_c(T0, frac, flag3, exc);
+        return;
+    }
+    Word32 f = -frac;
+    if (flag3 != 0) f *= 2;
+    const Word16 *x0 = exc - T0;
+    if (f < 0) {
+        f += 6;
+        --x0;
+    }
+    __m128i c1[10], c2[10];
+    for (int i = 0; i < 10; ++i) {
+        c1[i] = _mm_set1_epi32(vamrnb_tbl_pred_inter_6[f + 6 * i]);
+        c2[i] = _mm_set1_epi32(vamrnb_tbl_pred_inter_6[6 - f + 6 * i]);
+    }
+    for (int j = 0; j < L_SUBFR; j += 4) {
+        __m128i s = _mm_setzero_si128();
+        for (int i = 0; i < 10; ++i) {
+            s = sat_add(s, dmul(load4(x0 + j - i), c1[i]));
+            s = sat_add(s, dmul(load4(x0 + j + 1 + i), c2[i]));
+        }
+        store_round4(exc + j, s);
+    }
+}
+
+VAMRNB_SSE41 Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init) {
+    __m128i lo = _mm_setr_epi32(init, 0, 0, 0), hi = _mm_setzero_si128();
+    const Word32 steps = n <= 0 ? 1 : (n + 7) / 8;
+    for (Word32 s = 0; s < steps; ++s, x += 8) {
+        const __m128i a = load4(x), b = load4(x + 4);
+        lo = sat_add(lo, dmul(a, a));
+        hi = sat_add(hi, dmul(b, b));
+    }
+    const __m128i c = sat_add(lo, hi);                                  // lanes k + k+4
+    const __m128i d = sat_add(c, _mm_shuffle_epi32(c, _MM_SHUFFLE(1, 0, 3, 2)));   // 0+2, 1+3
+    const __m128i e = sat_add(d, _mm_shuffle_epi32(d, _MM_SHUFFLE(2, 3, 0, 1)));
+    return _mm_cvtsi128_si32(e);
+}
+
+// The running sum saturates nowhere when |init| plus the sum of all |terms|
+// fits in 32 bits; then it is the exact sum, formed with 16-bit pair products.
+// Otherwise the portable sequential version decides.
+VAMRNB_SSE41 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init) {
+    if (n <= 0) return init;
+    const Word32 n8 = n & ~7;
+    __m128i mx = _mm_setzero_si128(), my = _mm_setzero_si128(), acc = _mm_setzero_si128();
+    for (Word32 i = 0; i < n8; i += 8) {
+        const __m128i a = _mm_loadu_si128(reinterpret_cast<const __m128i *>(x + i));
+        const __m128i b = _mm_loadu_si128(reinterpret_cast<const __m128i *>(y + i));
+        mx = _mm_max_epu16(mx, _mm_abs_epi16(a));
+        my = _mm_max_epu16(my, _mm_abs_epi16(b));
+        acc = _mm_add_epi32(acc, _mm_madd_epi16(a, b));
+    }
+    alignas(16) uint16_t ax[8], ay[8];
+    alignas(16) int32_t sums[4];
+    _mm_store_si128(reinterpret_cast<__m128i *>(ax), mx);
+    _mm_store_si128(reinterpret_cast<__m128i *>(ay), my);
+    _mm_store_si128(reinterpret_cast<__m128i *>(sums), acc);
+    int64_t max_x = 0, max_y = 0;
+    for (int k = 0; k < 8; ++k) {
+        max_x = ax[k] > max_x ? ax[k] : max_x;
+        max_y = ay[k] > max_y ? ay[k] : max_y;
+    }
+    int64_t tail = 0;
+    for (Word32 i = n8; i < n; ++i) {
+        const int64_t px = x[i] < 0 ? -int64_t{x[i]} : x[i];
+        const int64_t py = y[i] < 0 ? -int64_t{y[i]} : y[i];
+        max_x = px > max_x ? px : max_x;
+        max_y = py > max_y ? py : max_y;
+        tail += int64_t{x[i]} * y[i];
+    }
+    const int64_t abs_init = init < 0 ? -int64_t{init} : init;
+    if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return inner_product_c(x, y, n, init);
+    const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
+    return static_cast<Word32>(init + 2 * total);
+}
+
+}  // namespace vamrnb
+
+#endif  // VAMRNB_DSP_X86
