@@ -362,3 +362,90 @@ TEST(CodebookMr122, ParametersDecodeToTheCodeVector) {
         EXPECT_GE(pulses, 5);
     }
 }
+
+// ---- gain quantisers -----------------------------------------------------------
+
+namespace {
+
+// A subframe whose target is 1.5 times the filtered adaptive vector, so that
+// an unlimited quantiser would pick a pitch gain above 1.
+void fill_high_gain_subframe(std::mt19937 &rng, subfr_frame &sf) {
+    const auto y1 = noise(rng, L_SUBFR, 2000);
+    const auto r = noise(rng, L_SUBFR, 300);
+    for (int i = 0; i < L_SUBFR; ++i) {
+        sf.y1[i] = y1[i];
+        sf.xn[i] = static_cast<Word16>(y1[i] + y1[i] / 2);
+        sf.code[i] = 0;
+        sf.y2[i] = r[i];
+        sf.xn2[i] = static_cast<Word16>(sf.xn[i] - y1[i]);
+        sf.res[i] = r[i];
+    }
+    sf.code[3] = 8191;
+    sf.code[21] = -8192;
+    // Normalised <y1,y1> and <xn,y1> with their exponents.
+    Word32 yy = 1, xy = 1;
+    for (int i = 0; i < L_SUBFR; ++i) {
+        yy = l_mac(yy, sf.y1[i], sf.y1[i]);
+        xy = l_mac(xy, sf.xn[i], sf.y1[i]);
+    }
+    sf.g_coeff[0] = round16(l_shl(yy, norm_l(yy)));
+    sf.g_coeff[1] = static_cast<Word16>(15 - norm_l(yy));
+    sf.g_coeff[2] = round16(l_shl(xy, norm_l(xy)));
+    sf.g_coeff[3] = static_cast<Word16>(15 - norm_l(xy));
+    sf.gain_pit = 19661;
+    sf.T0 = 60;
+}
+
+void reset_predictor(subfr_state &ss) {
+    for (int i = 0; i < 4; ++i) {
+        ss.pred.past_qua_en[i] = -14336;
+        ss.pred.past_qua_en_MR122[i] = -2381;
+    }
+}
+
+}  // namespace
+
+TEST(GainQuantisers, PitchGainNeverAboveTheLimit) {
+    auto st = std::make_unique<enc_state>();
+    auto fr = std::make_unique<enc_frame>();
+    std::mt19937 rng(795);
+    for (int32_t mode : {MR475, MR515, MR59, MR67, MR74, MR795, MR102}) {
+        for (Word16 limit : {Word16{15565}, Word16{9830}}) {
+            int at_limit = 0;
+            for (int trial = 0; trial < 20; ++trial) {
+                *st = enc_state{};
+                *fr = enc_frame{};
+                reset_predictor(st->sub);
+                fr->used_mode = mode;
+                fill_high_gain_subframe(rng, fr->sub);
+                fr->sub.gp_limit = limit;
+                vamrnbe_filt_update(st.get(), fr.get(), 0);
+                if (mode == MR475) {
+                    // The pair is quantised in the odd subframe.
+                    fill_high_gain_subframe(rng, fr->sub);
+                    fr->sub.gp_limit = limit;
+                    vamrnbe_filt_update(st.get(), fr.get(), 40);
+                }
+                const Word16 idx = fr->prm[0];
+                Word16 chosen[2];
+                int n = 1;
+                switch (mode) {
+                case MR475:
+                    chosen[0] = vamrnb_tb1_gain_mr475[4 * idx];
+                    chosen[1] = vamrnb_tb1_gain_mr475[4 * idx + 2];
+                    n = 2;
+                    break;
+                case MR795: chosen[0] = pitch_tbl[idx]; break;
+                case MR515:
+                case MR59: chosen[0] = vamrnb_tbl_gain_lowrates[4 * idx]; break;
+                default: chosen[0] = vamrnb_tbl_gain_highrates[4 * idx]; break;
+                }
+                for (int k = 0; k < n; ++k) {
+                    ASSERT_LE(chosen[k], limit) << "mode " << mode << " trial " << trial;
+                    at_limit += chosen[k] > limit - 2000;
+                }
+            }
+            EXPECT_GT(at_limit, 0) << "mode " << mode << ": gains never reached the limit";
+        }
+    }
+}
