@@ -1,0 +1,215 @@
+// Frame formats: the frame tables checked against each other, pack/unpack
+// round trips for every frame type the encoder writes, the packer's and the
+// unpacker's special cases, and the decoder homing tests.
+#include <gtest/gtest.h>
+
+#include <algorithm>
+#include <numeric>
+#include <random>
+#include <vector>
+
+#include "common/bitstream.h"
+#include "format/frame_format.h"
+
+using namespace vamrnb;
+
+namespace {
+
+std::vector<int16_t> random_params(std::mt19937 &rng, int mode) {
+    std::vector<int16_t> p(vamrnb_tbl_prmno[mode]);
+    for (size_t i = 0; i < p.size(); ++i) p[i] = int16_t(rng() & ((1u << vamrnb_tbl_bitno[mode][i]) - 1u));
+    return p;
+}
+
+// Packs the parameters (or, with as_bits, an already converted bit array)
+// as frame type ft into `out`; returns the bytes written.
+uint32_t pack(std::vector<int16_t> prm, int32_t ft, int32_t mode, int32_t tx_type,
+              std::vector<uint8_t> &out, uint32_t room = 64, int32_t *used = nullptr, bool as_bits = false) {
+    prm.resize(MAX_FRAME_BITS, 0);
+    if (!as_bits) vamrnbe_prm2bits(ft, prm.data());
+    out.assign(64, 0xEE);
+    vcmn_bsw w;
+    vcmn_bsw_init(&w, out.data(), room, nullptr);
+    const sid_sync_state sid{8, 3, 0, tx_type};
+    int32_t used_mode = ft;
+    vamrnbe_bs_pack(&w, prm.data(), mode, &used_mode, tx_type, &sid);
+    if (used) *used = used_mode;
+    return bsw_bytes_written(&w);
+}
+
+struct Unpacked {
+    rx_frame_class cls{-1, -1, -1};
+    int32_t mode = -1;
+    uint32_t consumed = 0;
+    std::vector<int16_t> serial = std::vector<int16_t>(SERIAL_SIZE, 0);
+};
+
+Unpacked unpack(const std::vector<uint8_t> &data, uint32_t size) {
+    Unpacked u;
+    vcmn_bsr r;
+    vcmn_bsr_init(&r, data.data(), size, nullptr);
+    vamrnbd_unpack_bits(&r, &u.cls, &u.mode, u.serial.data());
+    u.consumed = bsr_bytes_consumed(&r);
+    return u;
+}
+
+}  // namespace
+
+TEST(FrameTables, ConsistentWithEachOther) {
+    const int bitno_len[9] = {17, 19, 19, 19, 19, 23, 39, 57, 5};
+    static_assert(sizeof tab::bitno_MR122 == 57 * 2 && sizeof tab::bitno_MRDTX == 5 * 2);
+    for (int ft = 0; ft < 16; ++ft) {
+        EXPECT_EQ(vamrnb_tbl_toc_byte[ft], (ft << 3) | 4);
+        if (ft > 8) {
+            EXPECT_EQ(vamrnb_tbl_sort_ptr[ft], nullptr);
+            continue;
+        }
+        const int n = vamrnb_tbl_unpacked_size[ft], bits = n + (ft == 8 ? 4 : 0);
+        EXPECT_EQ(vamrnb_tbl_packed_size[ft], 1 + (bits + 7) / 8) << ft;
+        EXPECT_EQ(vamrnb_tbl_unused_size[ft], (vamrnb_tbl_packed_size[ft] - 1) * 8 - bits) << ft;
+        EXPECT_GE(vamrnb_tbl_unused_size[ft], 1) << ft;
+        std::vector<int16_t> order(vamrnb_tbl_sort_ptr[ft], vamrnb_tbl_sort_ptr[ft] + n);
+        std::sort(order.begin(), order.end());
+        for (int i = 0; i < n; ++i) ASSERT_EQ(order[i], i) << "not a permutation: " << ft;
+        EXPECT_EQ(vamrnb_tbl_prmno[ft], bitno_len[ft]);
+        EXPECT_EQ(std::accumulate(vamrnb_tbl_bitno[ft], vamrnb_tbl_bitno[ft] + bitno_len[ft], 0), n) << ft;
+        EXPECT_LE(vamrnb_tbl_prmnofsf[ft], vamrnb_tbl_prmno[ft]);
+        for (int j = 0; ft < 8 && j < vamrnb_tbl_prmno[ft]; ++j)  // homing values fit their widths
+            ASSERT_LT(tab::homing_frame_params[ft][j], 1 << vamrnb_tbl_bitno[ft][j]) << ft << " " << j;
+    }
+    EXPECT_EQ(vamrnb_tbl_unused_size[8], 1);
+    EXPECT_EQ(vamrnb_tbl_packed_size[15], 1);
+    EXPECT_EQ(vamrnb_tbl_prmno[9], 0);
+    EXPECT_EQ(vamrnb_tbl_bitno[9], nullptr);
+    // Check rows.
+    const int16_t mr515[] = {7, 6, 5, 4, 3, 2, 1, 0, 15, 14, 13, 12, 11, 10, 9, 8, 23, 24, 25, 26, 27, 46, 65, 84};
+    EXPECT_TRUE(std::equal(std::begin(mr515), std::end(mr515), vamrnb_tbl_sort_ptr[1]));
+    const int16_t mr122[] = {0, 1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11, 12, 13, 14, 23, 15, 16, 17, 18, 19, 20, 21, 22};
+    EXPECT_TRUE(std::equal(std::begin(mr122), std::end(mr122), vamrnb_tbl_sort_ptr[7]));
+    const int16_t dhf475[] = {0xF8, 0x9D, 0x1C, 0x66, 0, 3, 0x28, 0xF, 0x38, 1, 0xF, 0x31, 2, 8, 0xF, 0x26, 3};
+    EXPECT_TRUE(std::equal(std::begin(dhf475), std::end(dhf475), tab::homing_frame_params[0]));
+}
+
+TEST(FrameFormat, PackUnpackRoundTripEveryFrameType) {
+    std::mt19937 rng(21);
+    for (int trial = 0; trial < 50; ++trial) {
+        for (int ft = 0; ft <= 8; ++ft) {
+            const int32_t mode = int32_t(rng() % 8);
+            const int32_t tx = ft < 8 ? TX_SPEECH_GOOD : trial & 1 ? TX_SID_UPDATE : TX_SID_FIRST;
+            const auto prm = random_params(rng, ft);
+            std::vector<uint8_t> out;
+            const uint32_t written = pack(prm, ft, mode, tx, out);
+            ASSERT_EQ(written, uint32_t(vamrnb_tbl_packed_size[ft])) << ft;
+            ASSERT_EQ(out[0], vamrnb_tbl_toc_byte[ft]);
+            ASSERT_EQ(out[written - 1] & ((1 << vamrnb_tbl_unused_size[ft]) - 1), 0) << "padding " << ft;
+
+            const Unpacked u = unpack(out, written);
+            ASSERT_EQ(u.consumed, written) << ft;
+            std::vector<int16_t> back(MAX_PRM, -1);
+            vamrnbd_bits2prm(ft, u.serial.data(), back.data());
+            ASSERT_TRUE(std::equal(prm.begin(), prm.end(), back.begin())) << ft;
+            ASSERT_EQ(u.cls.quality, 1);
+            ASSERT_EQ(u.cls.rx_type, ft < 8 ? RX_SPEECH_GOOD : tx == TX_SID_UPDATE ? RX_SID_UPDATE : RX_SID_FIRST);
+            ASSERT_EQ(u.cls.frame_mode, ft < 8 ? ft : mode);
+        }
+    }
+    std::vector<uint8_t> out;
+    int32_t used = 0;
+    EXPECT_EQ(pack({}, 15, 3, TX_NO_DATA, out, 64, &used), 1u);
+    EXPECT_EQ(out[0], 0x7C);
+    EXPECT_EQ(used, 15);
+}
+
+TEST(FrameFormat, PackerSpecialCases) {
+    std::mt19937 rng(8);
+    std::vector<uint8_t> out, upd;
+    int32_t used = 0;
+    // SID_FIRST in MR795: 35 bits, STI 0, mode 5 LSB first (1, 0, 1), one
+    // zero; SID_UPDATE differs only in the STI bit.  MR515 sends 1, 0, 0.
+    const auto sid = random_params(rng, 8);
+    EXPECT_EQ(pack(sid, 8, 5, TX_SID_FIRST, out), 6u);
+    EXPECT_EQ(out[0], 68);
+    EXPECT_EQ(out[5] & 0x1F, 0x0A);
+    pack(sid, 8, 5, TX_SID_UPDATE, upd);
+    for (int i = 0; i < 6; ++i) EXPECT_EQ(upd[i] ^ out[i], i == 5 ? 0x10 : 0) << i;
+    pack(sid, 8, 1, TX_SID_UPDATE, out);
+    EXPECT_EQ(out[5] & 0x1F, 0x18);
+
+    // SID with TX_NO_DATA, and frame types nobody writes, become no data.
+    for (int32_t ft : {8, 9, 11, 14, 16, -1}) {
+        EXPECT_EQ(pack(sid, ft, 5, ft == 8 ? TX_NO_DATA : TX_SPEECH_GOOD, out, 64, &used, true), 1u) << ft;
+        EXPECT_EQ(out[0], 124);
+        EXPECT_EQ(used, 15);
+    }
+    // Only an element equal to 1 is sent as a one.
+    std::vector<int16_t> bits(MAX_FRAME_BITS, 0);
+    for (int i = 0; i < 95; ++i) bits[i] = int16_t(i % 3 == 0 ? 1 : i % 3 == 1 ? 2 : -1);
+    pack(bits, 0, 0, TX_SPEECH_GOOD, out, 64, nullptr, true);
+    const Unpacked u = unpack(out, 13);
+    for (int i = 0; i < 95; ++i) ASSERT_EQ(u.serial[i], i % 3 == 0) << i;
+    // A buffer that is too small takes what fits and nothing beyond.
+    EXPECT_EQ(pack(bits, 7, 7, TX_SPEECH_GOOD, out, 10, nullptr, true), 10u);
+    for (int i = 10; i < 64; ++i) ASSERT_EQ(out[i], 0xEE) << i;
+
+    // prm2bits keeps only the low bits of each parameter and clears the rest.
+    std::vector<int16_t> a(MAX_FRAME_BITS, 7);
+    a[0] = -1;
+    a[1] = 0x180;
+    vamrnbe_prm2bits(0, a.data());
+    for (int i = 0; i < MAX_FRAME_BITS; ++i) ASSERT_EQ(a[i], i < 9 ? 1 : i < 16 ? 0 : a[i]) << i;
+    for (int i = 95; i < MAX_FRAME_BITS; ++i) ASSERT_EQ(a[i], 0) << i;
+}
+
+TEST(FrameFormat, UnpackerClassification) {
+    std::vector<uint8_t> f(32, 0);
+    f[0] = 0x38;  // MR122, Q = 0
+    Unpacked u = unpack(f, 32);
+    EXPECT_TRUE(u.cls.quality == 0 && u.cls.rx_type == RX_SPEECH_BAD && u.mode == 7 && u.consumed == 32);
+
+    // SID 0x44: STI is bit 35 after the TOC byte; mode bits read as 1, 0, 0
+    // give MR515 while the caller's word keeps them as read.
+    std::vector<uint8_t> sid = {0x44, 0, 0, 0, 0, 0x18};
+    u = unpack(sid, 6);
+    EXPECT_TRUE(u.cls.rx_type == RX_SID_UPDATE && u.cls.frame_mode == 1 && u.mode == 4 && u.consumed == 6);
+    sid[5] = 0x08;
+    EXPECT_EQ(unpack(sid, 6).cls.rx_type, RX_SID_FIRST);
+    sid[0] = 0x40;
+    EXPECT_EQ(unpack(sid, 6).cls.rx_type, RX_SID_BAD);
+
+    // No data and unusable frame types: only the TOC byte is read.
+    for (uint8_t toc : {0x7C, 0x4C, 0x54, 0x5C, 0x64, 0xCC}) {
+        u = unpack({toc, 0xFF, 0xFF, 0xFF, 0xFF, 0xFF, 0xFF}, 7);
+        EXPECT_TRUE(u.cls.rx_type == RX_NO_DATA && u.cls.frame_mode == ((toc >> 3) & 15) && u.consumed == 1 &&
+                    u.mode == -1 && std::count(u.serial.begin(), u.serial.end(), 0) == SERIAL_SIZE) << int(toc);
+    }
+    // Truncated: missing class bits read as 1, a missing mode indication as 7.
+    u = unpack({0x04, 0, 0, 0, 0}, 5);
+    for (int i = 0; i < 95; ++i) ASSERT_EQ(u.serial[vamrnb_tbl_sort_ptr[0][i]], i >= 32) << i;
+    u = unpack({0x44, 0, 0, 0, 0}, 5);
+    EXPECT_TRUE(u.cls.rx_type == RX_SID_UPDATE && u.cls.frame_mode == 7 && u.mode == 7);
+    EXPECT_EQ(unpack({}, 0).cls.rx_type, RX_NO_DATA);
+}
+
+TEST(FrameFormat, DecoderHomingTests) {
+    for (int m = 0; m < 8; ++m) {
+        std::vector<int16_t> prm(tab::homing_frame_params[m], tab::homing_frame_params[m] + vamrnb_tbl_prmno[m]);
+        std::vector<uint8_t> out;
+        const Unpacked u = unpack(out, pack(prm, m, m, TX_SPEECH_GOOD, out));
+        const auto &s = u.serial;
+        EXPECT_EQ(vamrnbd_decoder_homing_frm_test(s.data(), m), 1) << m;
+        EXPECT_EQ(vamrnbd_decoder_homing_frm_test_first(s.data(), m), 1) << m;
+        EXPECT_EQ(vamrnbd_decoder_homing_frm_test(s.data(), (m + 1) % 8), 0) << m;
+
+        // Changing any parameter fails the whole-frame test; only changes
+        // after the first subframe leave the first-subframe test at 1.
+        int bit = 0;
+        for (int j = 0; j < vamrnb_tbl_prmno[m]; ++j) {
+            bit += vamrnb_tbl_bitno[m][j];
+            auto t = s;
+            t[bit - 1] ^= 1;
+            ASSERT_EQ(vamrnbd_decoder_homing_frm_test(t.data(), m), 0) << m << " " << j;
+            ASSERT_EQ(vamrnbd_decoder_homing_frm_test_first(t.data(), m), j >= vamrnb_tbl_prmnofsf[m]) << m << " " << j;
+        }
+    }
+    EXPECT_EQ(vamrnb_tbl_prmnofsf[7], 18);
+}
