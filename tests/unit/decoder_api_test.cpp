@@ -1,0 +1,274 @@
+// The decoder as a caller sees it, through the public header only: creation
+// and its status codes, output formats, channel settings and buffer layouts,
+// refused frame types, bytes consumed, the frame counter, reset and
+// independence of instances.
+#include <gtest/gtest.h>
+
+#include <cstdint>
+#include <cstring>
+#include <vector>
+
+#include "vamrnb.h"
+
+namespace {
+
+// Whole frame sizes in bytes (table-of-contents byte included) by frame type.
+constexpr uint32_t kFrameBytes[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6, 1, 1, 1, 1};
+constexpr uint32_t kConsumed[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 1, 0, 0, 1, 1, 1, 1};
+
+using Frame = std::vector<uint8_t>;
+
+// A storage-format frame of type ft with pseudo-random payload bits: every
+// bit pattern is a valid frame for the decoder.
+Frame make_frame(int ft, uint32_t &seed, bool good = true) {
+    Frame f(kFrameBytes[ft]);
+    f[0] = static_cast<uint8_t>(ft << 3 | (good ? 4 : 0));
+    for (size_t i = 1; i < f.size(); ++i) {
+        seed = seed * 1664525u + 1013904223u;
+        f[i] = static_cast<uint8_t>(seed >> 24);
+    }
+    return f;
+}
+
+// Speech of every mode, bad speech, lost frames, SIDs and reserved types.
+std::vector<Frame> mixed_stream(uint32_t seed, int n = 60) {
+    static const int kTypes[] = {7, 7, 0, 3, 5, 15, 6, 1, 2, 4, 8, 15, 15, 9, 12, 7, 14, 13};
+    std::vector<Frame> s;
+    for (int i = 0; i < n; ++i) {
+        const int ft = kTypes[i % (sizeof kTypes / sizeof kTypes[0])];
+        s.push_back(make_frame(ft, seed, i % 11 != 4));
+    }
+    return s;
+}
+
+codec_config config(int32_t layout, int32_t channels, int32_t format) {
+    codec_config c{};
+    c.dec.layout = layout;
+    c.dec.channels = channels;
+    c.dec.sample_format = format;
+    return c;
+}
+
+struct Decoder {
+    vamrnb_decoder *d = nullptr;
+    uint8_t buf[3][2 * 160 * 3 + 16] = {};
+    pcm_buffer pcm{};
+    frame_info info{};
+
+    explicit Decoder(const codec_config &c) {
+        int32_t err = 1;
+        d = vamrnbd_create(&c, &err);
+        EXPECT_EQ(err, AMRNB_OK);
+        for (int i = 0; i < 3; ++i) pcm.data[i] = buf[i];
+    }
+    ~Decoder() { vamrnbd_delete(d); }
+    Decoder(const Decoder &) = delete;
+    Decoder &operator=(const Decoder &) = delete;
+
+    int32_t decode(const uint8_t *p, uint32_t size) {
+        bitstream_buffer in{const_cast<uint8_t *>(p), 0, size};
+        return vamrnbd_decode(d, &in, &pcm, &info);
+    }
+    int32_t decode(const Frame &f) { return decode(f.data(), static_cast<uint32_t>(f.size())); }
+
+    // 16-bit mono output of one frame (format 0, interleaved).
+    std::vector<int16_t> pcm16() const {
+        std::vector<int16_t> v(160);
+        std::memcpy(v.data(), buf[0], 320);
+        return v;
+    }
+};
+
+// Decodes a stream with format 0 mono; refused frames give no output.
+std::vector<std::vector<int16_t>> decode_all(Decoder &d, const std::vector<Frame> &s) {
+    std::vector<std::vector<int16_t>> out;
+    for (const Frame &f : s)
+        if (d.decode(f) == AMRNB_OK) out.push_back(d.pcm16());
+    return out;
+}
+
+}  // namespace
+
+TEST(DecoderApi, CreateChecksReservedWord) {
+    codec_config c = config(1, 1, 0);
+    c.word[0] = 1;
+    int32_t err = 0;
+    EXPECT_EQ(vamrnbd_create(&c, &err), nullptr);
+    EXPECT_EQ(err, AMRNB_ERR_UNSUPPORTED);
+    EXPECT_EQ(vamrnbd_create(&c, nullptr), nullptr);  // no error word to write
+
+    c.word[0] = 0;
+    vamrnb_decoder *d = vamrnbd_create(&c, nullptr);
+    ASSERT_NE(d, nullptr);
+    vamrnbd_delete(d);
+    vamrnbd_delete(nullptr);
+}
+
+TEST(DecoderApi, SampleFormatsConvertTheSameSignal) {
+    const auto stream = mixed_stream(7);
+    Decoder ref(config(1, 1, 0));
+    Decoder f1(config(1, 1, 1)), f2(config(1, 1, 2)), f3(config(1, 1, 3));
+    bool saw_large = false;
+    for (const Frame &fr : stream) {
+        const int32_t st = ref.decode(fr);
+        for (Decoder *d : {&f1, &f2, &f3}) ASSERT_EQ(d->decode(fr), st);
+        if (st != AMRNB_OK) continue;
+
+        EXPECT_EQ(ref.info.bits_per_sample, 16u);
+        EXPECT_EQ(ref.info.channels, 1u);
+        EXPECT_EQ(ref.pcm.samples[0], 160u);
+        EXPECT_EQ(ref.pcm.bytes[0], 320u);
+        EXPECT_EQ(f1.info.bits_per_sample, 8u);
+        EXPECT_EQ(f1.pcm.bytes[0], 160u);
+        EXPECT_EQ(f2.info.bits_per_sample, 16u);
+        EXPECT_EQ(f3.info.bits_per_sample, 24u);
+        EXPECT_EQ(f3.pcm.bytes[0], 480u);
+        EXPECT_EQ(f3.pcm.bits_per_sample, 24u);
+
+        const auto s = ref.pcm16();
+        EXPECT_EQ(std::memcmp(f2.buf[0], ref.buf[0], 320), 0);
+        for (int i = 0; i < 160; ++i) {
+            EXPECT_EQ(s[i] & 7, 0) << "13-bit output";
+            int v8 = (s[i] + 128) >> 8;
+            v8 = v8 > 127 ? 127 : v8;
+            ASSERT_EQ(static_cast<int8_t>(f1.buf[0][i]), v8) << s[i];
+            ASSERT_EQ(f3.buf[0][3 * i], 0);
+            ASSERT_EQ(f3.buf[0][3 * i + 1], static_cast<uint8_t>(s[i] & 0xff));
+            ASSERT_EQ(f3.buf[0][3 * i + 2], static_cast<uint8_t>((s[i] >> 8) & 0xff));
+            saw_large |= s[i] > 0x7f00 || s[i] < -0x7f00 || (s[i] > 1000 && s[i] < 30000);
+        }
+    }
+    EXPECT_TRUE(saw_large);
+}
+
+TEST(DecoderApi, ChannelsAndLayouts) {
+    const auto stream = mixed_stream(11, 20);
+    Decoder mono(config(1, 1, 0));
+    Decoder ch0(config(1, 0, 0));
+    Decoder inter(config(1, 2, 0));
+    Decoder sep(config(0, 2, 0));
+    Decoder sep24(config(5, 2, 3));  // any layout but 1 means separate buffers
+    for (const Frame &fr : stream) {
+        const int32_t st = mono.decode(fr);
+        for (Decoder *d : {&ch0, &inter, &sep, &sep24}) ASSERT_EQ(d->decode(fr), st);
+        if (st != AMRNB_OK) continue;
+
+        EXPECT_EQ(std::memcmp(ch0.buf[0], mono.buf[0], 320), 0);
+        EXPECT_EQ(ch0.info.channels, 1u);
+
+        EXPECT_EQ(inter.info.channels, 2u);
+        EXPECT_EQ(inter.pcm.channels, 2u);
+        EXPECT_EQ(inter.pcm.layout, 1u);
+        EXPECT_EQ(inter.pcm.samples[0], 320u);
+        EXPECT_EQ(inter.pcm.bytes[0], 640u);
+        const auto s = mono.pcm16();
+        int16_t both[320];
+        std::memcpy(both, inter.buf[0], 640);
+        for (int i = 0; i < 160; ++i) {
+            ASSERT_EQ(both[2 * i], s[i]);
+            ASSERT_EQ(both[2 * i + 1], s[i]);
+        }
+
+        EXPECT_EQ(sep.pcm.layout, 0u);
+        EXPECT_EQ(sep.pcm.samples[1], 160u);
+        EXPECT_EQ(sep.pcm.samples[2], 160u);
+        EXPECT_EQ(sep.pcm.bytes[1], 320u);
+        EXPECT_EQ(sep.pcm.bytes[2], 320u);
+        EXPECT_EQ(std::memcmp(sep.buf[1], mono.buf[0], 320), 0);
+        EXPECT_EQ(std::memcmp(sep.buf[2], mono.buf[0], 320), 0);
+
+        EXPECT_EQ(sep24.pcm.layout, 5u);
+        EXPECT_EQ(sep24.pcm.bytes[1], 480u);
+        EXPECT_EQ(std::memcmp(sep24.buf[1], sep24.buf[2], 480), 0);
+        EXPECT_EQ(sep24.buf[1][1], static_cast<uint8_t>(s[0] & 0xff));
+    }
+}
+
+TEST(DecoderApi, RefusedOutputSettings) {
+    uint32_t seed = 3;
+    const Frame fr = make_frame(7, seed);
+    for (const codec_config &c : {config(1, 3, 0), config(1, -1, 0), config(1, 0, 1),
+                                  config(1, 0, 3), config(0, 1, 4), config(1, 2, -1)}) {
+        Decoder d(c);
+        d.info.frame_count = 41;
+        EXPECT_EQ(d.decode(fr), AMRNB_ERR_UNSUPPORTED)
+            << c.dec.layout << ' ' << c.dec.channels << ' ' << c.dec.sample_format;
+        EXPECT_EQ(d.info.frame_count, 41u);
+    }
+}
+
+TEST(DecoderApi, RefusedFrameTypesLeaveNoTrace) {
+    uint32_t seed = 99;
+    const auto stream = mixed_stream(21, 40);
+    std::vector<Frame> with_refused;
+    for (size_t i = 0; i < stream.size(); ++i) {
+        with_refused.push_back(stream[i]);
+        if (i % 5 == 2) with_refused.push_back(make_frame(10 + (i % 2), seed));
+    }
+
+    Decoder plain(config(1, 1, 0)), other(config(1, 1, 0));
+    const auto expect = decode_all(plain, stream);
+    std::vector<std::vector<int16_t>> got;
+    uint32_t count = 0;
+    for (const Frame &f : with_refused) {
+        const int ft = (f[0] >> 3) & 15;
+        other.info.produced = 77;
+        const int32_t st = other.decode(f);
+        if (ft == 10 || ft == 11) {
+            EXPECT_EQ(st, AMRNB_ERR_BAD_FRAME_TYPE);
+            EXPECT_EQ(other.info.produced, 0u);
+            EXPECT_EQ(other.info.frame_count, count);
+            continue;
+        }
+        ASSERT_EQ(st, AMRNB_OK);
+        EXPECT_EQ(other.info.produced, 1u);
+        EXPECT_EQ(other.info.frame_count, ++count);
+        got.push_back(other.pcm16());
+    }
+    EXPECT_EQ(got, expect);
+}
+
+TEST(DecoderApi, BytesConsumedPerFrameType) {
+    Decoder d(config(1, 1, 0));
+    uint32_t seed = 1;
+    for (int ft = 0; ft < 16; ++ft) {
+        if (ft == 10 || ft == 11) continue;
+        // Frames back to back: only the first one is read.
+        Frame f = make_frame(ft, seed);
+        const Frame g = make_frame(7, seed);
+        f.insert(f.end(), g.begin(), g.end());
+        ASSERT_EQ(d.decode(f), AMRNB_OK) << ft;
+        EXPECT_EQ(d.info.bytes, kConsumed[ft]) << ft;
+    }
+
+    // A truncated frame never reports more than it was given.
+    const Frame f = make_frame(7, seed);
+    for (uint32_t n : {1u, 5u, 31u}) {
+        ASSERT_EQ(d.decode(f.data(), n), AMRNB_OK);
+        EXPECT_LE(d.info.bytes, n);
+    }
+}
+
+TEST(DecoderApi, ResetMatchesFreshInstanceAndInstancesAreIndependent) {
+    const auto warmup = mixed_stream(31, 25);
+    const auto stream = mixed_stream(32, 50);
+
+    Decoder fresh(config(1, 1, 0));
+    const auto expect = decode_all(fresh, stream);
+
+    Decoder used(config(1, 1, 0));
+    decode_all(used, warmup);
+    vamrnbd_reset(used.d);
+    EXPECT_EQ(decode_all(used, stream), expect);
+
+    // Two instances fed alternately give what each gives alone.
+    Decoder a(config(1, 1, 0)), b(config(1, 1, 0)), b_alone(config(1, 1, 0));
+    const auto expect_b = decode_all(b_alone, warmup);
+    std::vector<std::vector<int16_t>> got_a, got_b;
+    for (size_t i = 0; i < std::max(stream.size(), warmup.size()); ++i) {
+        if (i < stream.size() && a.decode(stream[i]) == AMRNB_OK) got_a.push_back(a.pcm16());
+        if (i < warmup.size() && b.decode(warmup[i]) == AMRNB_OK) got_b.push_back(b.pcm16());
+    }
+    EXPECT_EQ(got_a, expect);
+    EXPECT_EQ(got_b, expect_b);
+}
