@@ -8,17 +8,13 @@
 #include "dec/dtx_dec.h"
 
 #include "basic_op/ext_op.h"
+#include "dec/d_plsf.h"
 #include "dec/dec_state.h"
-#include "format/frame_tables.h"
+#include "format/frame_format.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 
 #include <algorithm>
-
-// Three-split LSF dequantiser of the speech decoder.
-extern "C" void vamrnbd_d_plsf_3(int32_t mode, int32_t bfi, const int16_t *indices,
-                                 int16_t past_lsf_q[10], int16_t past_r_q[10],
-                                 int16_t lsp_out[10]);
 
 namespace vamrnb {
 namespace {
@@ -30,16 +26,6 @@ constexpr Word16 kMaxEmpty = 50;          // frames without SID update before mu
 constexpr Word32 kSeedInit = 0x70816958;  // pseudo-noise generator start value
 
 void copy10(Word16 *dst, const Word16 *src) { std::copy_n(src, M, dst); }
-
-// Serial bits to codec parameters with the widths of `mode`.
-void serial_to_prm(int32_t mode, const Word16 *serial, Word16 *prm) {
-    const int16_t *widths = vamrnb_tbl_bitno[mode];
-    for (int j = 0; j < vamrnb_tbl_prmno[mode]; ++j) {
-        Word32 v = 0;
-        for (int b = 0; b < widths[j]; ++b) v = (v << 1) | (*serial++ == 1 ? 1 : 0);
-        prm[j] = wrap16(v);
-    }
-}
 
 // LSF (Q15 normalised frequency) to LSP (cosine domain).
 void lsf_to_lsp(const Word16 lsf[M], Word16 lsp[M]) {
@@ -368,7 +354,7 @@ extern "C" void vamrnbd_dtx(dec_state *st, dec_work *w, const int16_t **cursor) 
     // SID parameters have their own layout; every other frame is read with
     // the tables of its codec mode (a lost frame with the last mode).
     const bool sid_params = rx == RX_SID_UPDATE || rx == RX_SID_BAD;
-    serial_to_prm(sid_params ? MRDTX : mode, w->serial, w->prm);
+    vamrnbd_bits2prm(sid_params ? MRDTX : mode, w->serial, w->prm);
     *cursor = w->prm;
 
     const auto prev = static_cast<dtx_global_state>(st->cn.dtxGlobalState);
