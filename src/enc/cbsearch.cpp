@@ -310,7 +310,7 @@ void search_10and8i40(Word16 nb_pulse, Word16 step, Word16 nb_tracks, const Word
                     alp2 = l_mac(alp2, rr[ia][ib], ab_cross[lv]);
                     const Word16 sq2 = mult(ps2, ps2);
                     const Word16 alp_16 = round16(alp2);
-                    if (l_msu(l_mult(alp, sq2), sq, alp_16) > 0) {
+                    if (better(sq2, alp_16, sq, alp)) {
                         sq = sq2;
                         ps = ps2;
                         alp = alp_16;
@@ -323,7 +323,7 @@ void search_10and8i40(Word16 nb_pulse, Word16 step, Word16 nb_tracks, const Word
             p[na + 1] = best_b;
         }
 
-        if (l_msu(l_mult(alpk, sq), psk, alp) > 0) {
+        if (better(sq, alp, psk, alpk)) {
             psk = sq;
             alpk = alp;
             for (int k = 0; k < nb_pulse; ++k) codvec[k] = static_cast<Word16>(p[k]);

@@ -49,12 +49,6 @@ void set_sign(Word16 *dn, Word16 *sign, Word16 *dn2, int n) {
     }
 }
 
-// The candidate (sq, alp) beats the best so far (sqk, alpk) when
-// sq/alp > sqk/alpk, compared cross-multiplied.
-inline bool better(Word16 sq, Word16 alp, Word16 sqk, Word16 alpk) {
-    return l_msu(l_mult(alpk, sq), sqk, alp) > 0;
-}
-
 // Two pulses: first on the track starting at p0, second at p1.
 void search_pair(const Word16 *dn, const matrix &rr, int p0, int p1, Word16 &psk,
                  Word16 &alpk, Word16 *codvec) {
@@ -179,12 +173,11 @@ inline void split_pos(Word16 pos, Word16 *index, Word16 *track) {
 
 void filter_pulses(const Word16 *h, const Word16 *codvec, const Word16 *signs, int n,
                    Word16 *y) {
+    const Word16 *hp[10];
+    for (int k = 0; k < n; ++k) hp[k] = h - codvec[k];
     for (int i = 0; i < L_CODE; ++i) {
         Word32 s = 0;
-        for (int k = 0; k < n; ++k) {
-            // h is zero before its start: such terms add nothing.
-            if (i >= codvec[k]) s = l_mac(s, h[i - codvec[k]], signs[k]);
-        }
+        for (int k = 0; k < n; ++k) s = l_mac(s, hp[k][i], signs[k]);
         y[i] = round16(s);
     }
 }

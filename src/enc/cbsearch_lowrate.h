@@ -5,11 +5,21 @@
 
 namespace vamrnb {
 
-// Filtered code vector: y[i] = round(sum_k h[i - codvec[k]] * signs[k]).
+// The candidate (sq, alp) beats the best so far (sqk, alpk) when
+// sq/alp > sqk/alpk.  The fixed-point criterion alpk*sq - sqk*alp > 0 only
+// saturates towards its own sign, so an exact product comparison decides
+// the same way.
+inline bool better(Word16 sq, Word16 alp, Word16 sqk, Word16 alpk) {
+    return int64_t{alpk} * sq > int64_t{sqk} * alp;
+}
+
+// Filtered code vector: y[i] = round(sum_k h[i - codvec[k]] * signs[k]);
+// h[-39..-1] must be readable and zero.
 void filter_pulses(const Word16 *h, const Word16 *codvec, const Word16 *signs, int n,
                    Word16 *y);
 
-// Two-, three- and four-pulse codebooks (modes MR475..MR795).  Sharpens h
+// Two-, three- and four-pulse codebooks (modes MR475..MR795); h[-39..-1]
+// must be readable and zero.  Sharpens h
 // (in place) and the code vector when T0 < 40, writes the code vector and
 // its filtered version, returns the position index and the sign word.
 Word16 code_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *x, Word16 *h, Word16 T0,
