@@ -20,10 +20,6 @@ constexpr Word16 LOG2_FRAME_Q10 = 8521;   // log2(160) in Q10
 constexpr Word16 SEED_MIN = -14436;
 constexpr Word16 MR122_SCALE = 5443;      // 20·log10(2) scaling, Q15
 
-// An MRDTX frame inside a shortened hangover normally repeats the stored SID
-// parameters; while the stored energy index is 0 they are refreshed anyway.
-constexpr bool REFRESH_ON_ZERO_INDEX = true;
-
 }  // namespace
 
 void dtx_enc_init(dtx_enc_state *st) {
@@ -78,7 +74,10 @@ extern "C" void vamrnbe_dtx(vamrnb_encoder *st, vamrnb::enc_frame *fr) {
     using namespace vamrnb;
     dtx_enc_state *d = &st->dtx;
 
-    if (fr->compute_sid != 0 || (REFRESH_ON_ZERO_INDEX && d->log_en_index == 0)) {
+    // An MRDTX frame inside a shortened hangover repeats the stored SID
+    // parameters, except while the stored energy index is 0 (nothing useful
+    // stored yet, or digital silence): then they are refreshed as well.
+    if (fr->compute_sid != 0 || d->log_en_index == 0) {
         // Averaged LSP vector of the history.
         Word32 sum[M] = {};
         for (int s = 0; s < DTX_HIST_SIZE; ++s)

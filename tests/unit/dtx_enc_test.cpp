@@ -291,3 +291,15 @@ TEST(DtxSid, ComputedParametersSeedThePredictor) {
     // The quantiser's memory is cleared afterwards like every other memory.
     for (int i = 0; i < 10; ++i) EXPECT_EQ(f.enc.past_rq[i], 0);
 }
+
+// A stored energy index of 0 is refreshed even inside a shortened hangover.
+TEST(DtxSid, ZeroEnergyIndexIsRefreshed) {
+    sid_fixture f;
+    for (auto &h : f.enc.dtx.log_en_hist) h = 1000;   // index 14
+    f.enc.dtx.log_en_index = 0;
+    f.fr.compute_sid = 0;
+    vamrnbe_dtx(&f.enc, &f.fr);
+    EXPECT_EQ(f.params()[4], 14);
+    EXPECT_EQ(f.enc.sub.pred.past_qua_en[0], 14 * 256 - 11560);
+}
+
