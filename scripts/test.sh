@@ -11,3 +11,11 @@ vamrnb_setup_deps
 cmake -S . -B build -DCMAKE_BUILD_TYPE=Release -DVAMRNB_BUILD_TESTS=ON "$@"
 cmake --build build -j2
 ctest --test-dir build --output-on-failure -j2
+
+# The conformance tallies (frames exact / frames checked) of the runs above.
+log=build/Testing/Temporary/LastTest.log
+if [ -f "$log" ] && grep -q '^\(decoder\|encoder\), ' "$log"; then
+    echo
+    echo "== conformance =="
+    sed -n '/^\(decoder\|encoder\), /,/^  total/p' "$log"
+fi
