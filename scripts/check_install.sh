@@ -1,7 +1,7 @@
 #!/usr/bin/env bash
 # Installs a build tree into a scratch prefix, then builds and runs a small C
-# program against the installed library twice: through pkg-config and through
-# find_package(vamrnb) in a throw-away CMake project.
+# program against the installed library: through pkg-config, and through
+# find_package(vamrnb) in a throw-away CMake project (shared and static).
 #   scripts/check_install.sh <build-dir> <scratch-dir>
 set -euo pipefail
 build=$(cd "${1:?usage: check_install.sh <build-dir> <scratch-dir>}" && pwd)
@@ -34,11 +34,12 @@ project(vamrnb_consumer C CXX)
 find_package(vamrnb 0 REQUIRED CONFIG)
 add_executable(smoke_shared $src/tests/abi/api_smoke.c)
 target_link_libraries(smoke_shared PRIVATE vamrnb::vamrnb)
-add_library(probe_static STATIC $src/tests/abi/header_c11.c)
-target_link_libraries(probe_static PRIVATE vamrnb::vamrnb_static)
+add_executable(smoke_static $src/tests/abi/api_smoke.c)
+target_link_libraries(smoke_static PRIVATE vamrnb::vamrnb_static)
 CMAKE
 "$cmake_bin" -S "$scratch/consumer" -B "$scratch/consumer/build" \
     -DCMAKE_PREFIX_PATH="$prefix" -DCMAKE_BUILD_TYPE=Release >/dev/null
 "$cmake_bin" --build "$scratch/consumer/build" >/dev/null
 "$scratch/consumer/build/smoke_shared" >/dev/null
+"$scratch/consumer/build/smoke_static" >/dev/null
 echo "check_install: pkg-config and find_package consumers built and ran"
