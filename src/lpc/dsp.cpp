@@ -16,11 +16,11 @@ constexpr DspKernels kScalar = {
 
 #if defined(VAMRNB_DSP_X86)
 constexpr DspKernels kSse41 = {
-    syn_filt_sse41, syn_filt_m_sse41, residu_sse41, pred_lt_3or6_sse41, energy_sse41,
+    syn_filt_c, syn_filt_m_sse41, residu_sse41, pred_lt_3or6_sse41, energy_sse41,
     inner_product_sse41,
 };
 constexpr DspKernels kSse41Avx2 = {
-    syn_filt_sse41, syn_filt_m_sse41, residu_avx2, pred_lt_3or6_avx2, energy_sse41,
+    syn_filt_c, syn_filt_m_sse41, residu_avx2, pred_lt_3or6_avx2, energy_sse41,
     inner_product_sse41,
 };
 // AVX2 allowed while SSE4.1 is masked off: only the AVX2 kernels.

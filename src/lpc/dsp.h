@@ -53,7 +53,6 @@ Word32 inner_product_c(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
 // ---- vector versions (defined only where the build targets them) -----------
 #if defined(__x86_64__) || defined(__i386__)
 #define VAMRNB_DSP_X86 1
-void syn_filt_sse41(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
 void syn_filt_m_sse41(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
 void residu_sse41(const Word16 *a, const Word16 *x, Word16 *y);
 void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);

@@ -1,0 +1,121 @@
+// Subframe kernels, portable version against each vector version this
+// processor runs.  Arguments: the kernel set (0 = portable, then the
+// VAMRNB_CPU_* bits); sets the processor lacks are skipped.
+#include <benchmark/benchmark.h>
+
+#include <cstdint>
+#include <random>
+
+#include "lpc/dsp.h"
+#include "lpc/lpc.h"
+
+using namespace vamrnb;
+
+namespace {
+
+struct Data {
+    int16_t a[11];
+    int16_t x[200];
+    int16_t y[200];
+    int16_t mem[10];
+    Data() {
+        std::mt19937 rng(1);
+        std::uniform_int_distribution<int> d(-4000, 4000);
+        const int16_t filt[11] = {4096, -5000, 3000, -1500, 800, -400, 200, -100, 50, -25, 12};
+        for (int i = 0; i < 11; ++i) a[i] = filt[i];
+        for (auto &v : x) v = static_cast<int16_t>(d(rng));
+        for (auto &v : y) v = static_cast<int16_t>(d(rng));
+        for (auto &v : mem) v = static_cast<int16_t>(d(rng));
+    }
+};
+
+const Data &data() {
+    static const Data d;
+    return d;
+}
+
+// The kernel set for the benchmark's argument, or null to skip.
+const DspKernels *kernels(benchmark::State &state) {
+    const auto flags = static_cast<uint32_t>(state.range(0));
+    if ((cpu_detect() & flags) != flags) {
+        state.SkipWithError("not supported by this processor");
+        return nullptr;
+    }
+    return &dsp_for(flags);
+}
+
+void BM_syn_filt(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    const Data &d = data();
+    int16_t y[40];
+    for (auto _ : state) {
+        k->syn_filt(d.a, d.x, d.mem, y);
+        benchmark::DoNotOptimize(y);
+    }
+}
+
+void BM_syn_filt_m(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    const Data &d = data();
+    int16_t buf[50] = {};
+    int32_t ovf = 0;
+    for (auto _ : state) {
+        k->syn_filt_m(d.a, d.x, &ovf, buf);
+        benchmark::DoNotOptimize(buf);
+    }
+}
+
+void BM_residu(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    const Data &d = data();
+    int16_t y[40];
+    for (auto _ : state) {
+        k->residu(d.a, d.x + 10, y);
+        benchmark::DoNotOptimize(y);
+    }
+}
+
+void BM_pred_lt_3or6(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    int16_t exc[200];
+    for (auto _ : state) {
+        state.PauseTiming();
+        for (int i = 0; i < 200; ++i) exc[i] = data().x[i];
+        state.ResumeTiming();
+        k->pred_lt_3or6(57, 1, 1, exc + 150);
+        benchmark::DoNotOptimize(exc);
+    }
+}
+
+void BM_energy(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    const Data &d = data();
+    for (auto _ : state) benchmark::DoNotOptimize(k->energy(d.x, 160, 0));
+}
+
+void BM_inner_product(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    const Data &d = data();
+    for (auto _ : state) benchmark::DoNotOptimize(k->inner_product(d.x, d.y, 40, 0));
+}
+
+void sets(benchmark::internal::Benchmark *b) {
+    b->ArgName("cpu");
+    for (int64_t flags : {int64_t{0}, int64_t{kCpuSse41}, int64_t{kCpuAvx2 | kCpuSse41}, int64_t{kCpuNeon}})
+        b->Arg(flags);
+}
+
+}  // namespace
+
+BENCHMARK(BM_syn_filt)->Apply(sets);
+BENCHMARK(BM_syn_filt_m)->Apply(sets);
+BENCHMARK(BM_residu)->Apply(sets);
+BENCHMARK(BM_pred_lt_3or6)->Apply(sets);
+BENCHMARK(BM_energy)->Apply(sets);
+BENCHMARK(BM_inner_product)->Apply(sets);
