@@ -1,6 +1,6 @@
 // Voice activity detectors: band splitting, low-power and hangover rules of
-// option 1, the option-2 transform and decisions, and the per-frame entry
-// point's option dispatch.
+// option 1, the option-2 transform, and the per-frame entry point's option
+// dispatch.  (Bit-exactness is shown by the conformance vectors.)
 #include <gtest/gtest.h>
 
 #include <cmath>
@@ -54,23 +54,6 @@ int argmax_level(const vad1_state &st) {
 
 // ---- option 1 -------------------------------------------------------------------
 
-TEST(Vad1, InitialState) {
-    vad1_state st;
-    std::memset(&st, 0x55, sizeof st);
-    vad1_init(&st);
-    for (int i = 0; i < VAD_BANDS; ++i) {
-        EXPECT_EQ(st.bckr_est[i], 150);
-        EXPECT_EQ(st.ave_level[i], 150);
-        EXPECT_EQ(st.old_level[i], 150);
-        EXPECT_EQ(st.sub_level[i], 0);
-    }
-    EXPECT_EQ(st.best_corr_hp, 13106);
-    EXPECT_EQ(st.corr_hp_fast, 13106);
-    EXPECT_EQ(st.vadreg, 0);
-    EXPECT_EQ(st.a_data5[2][1], 0);
-    EXPECT_EQ(st.a_data3[4], 0);
-}
-
 // Each band of the filter bank must collect the tone that falls into it.
 TEST(Vad1, FilterBankPutsTonesInTheirBands) {
     const struct { double hz; int band; } cases[] = {
@@ -91,30 +74,24 @@ TEST(Vad1, FilterBankPutsTonesInTheirBands) {
 }
 
 // The level of a band covers the previous frame's look-ahead tail and the
-// whole current band signal; the tail is carried to the next frame.
+// whole current band signal; the tail is carried to the next frame, and
+// scale 15 (the top band) halves both.
 TEST(Vad1, LevelCalculationCarriesTheLookAhead) {
-    // Band 0 layout: step 16, start 0, samples 0..7 head, 8..9 look-ahead.
+    // Band 0 layout: step 16, start 0; samples 8 and 9 are the look-ahead.
     Word16 a[160] = {}, b[160] = {};
     for (int i = 0; i < 10; ++i) {
-        a[16 * i] = static_cast<Word16>(i < 8 ? 1000 : -300 * i);  // tail: -2400, -2700
-        b[16 * i] = static_cast<Word16>(i < 8 ? 100 + i : 5000);
+        a[16 * i] = static_cast<Word16>(i < 8 ? 1000 : -300 * i);
+        b[16 * i] = static_cast<Word16>(i < 8 ? 100 : 5000);
     }
-    Word16 sub = 0;
-    vamrnbe_lev_calculation(a, 8, 10, 16, 0, 16, &sub);
-    const int tail_a = 2 * (2400 + 2700);
-    EXPECT_EQ(sub, tail_a);
-    const Word16 lev = vamrnbe_lev_calculation(b, 8, 10, 16, 0, 16, &sub);
-    int head_b = 0;
-    for (int i = 0; i < 8; ++i) head_b += 2 * (100 + i);
-    const int tail_b = 2 * 2 * 5000;
-    EXPECT_EQ(lev, tail_a + head_b + tail_b);
-    EXPECT_EQ(sub, tail_b);
-
-    // Scale 15 (the top band) halves both the carried part and the level.
-    sub = 0;
-    vamrnbe_lev_calculation(a, 8, 10, 16, 0, 15, &sub);
-    EXPECT_EQ(sub, tail_a / 2);
-    EXPECT_EQ(vamrnbe_lev_calculation(b, 8, 10, 16, 0, 15, &sub), (tail_a + head_b + tail_b) / 2);
+    const int tail_a = 2 * (2400 + 2700), whole_b = 2 * (8 * 100 + 2 * 5000);
+    for (int scale : {16, 15}) {
+        Word16 sub = 0;
+        vamrnbe_lev_calculation(a, 8, 10, 16, 0, scale, &sub);
+        EXPECT_EQ(sub, tail_a >> (16 - scale));
+        EXPECT_EQ(vamrnbe_lev_calculation(b, 8, 10, 16, 0, scale, &sub),
+                  (tail_a + whole_b) >> (16 - scale));
+        EXPECT_EQ(sub, (2 * 2 * 5000) >> (16 - scale));
+    }
 }
 
 // Frames below the power floor decide 0 and drop every pending hangover,
@@ -132,12 +109,8 @@ TEST(Vad1, LowPowerForcesSilence) {
     int k = 0;
     buf.next([&] { return static_cast<Word16>((k++ & 1) ? 6 : -6); });  // power 11520
     EXPECT_EQ(vad1(&st, buf.fresh()), 0);
-    EXPECT_EQ(st.hang_count, 0);
-    EXPECT_EQ(st.burst_count, 0);
-    EXPECT_EQ(st.complex_hang_count, 0);
-    EXPECT_EQ(st.complex_hang_timer, 0);
+    EXPECT_EQ(st.hang_count | st.burst_count | st.complex_hang_count | st.complex_hang_timer, 0);
     EXPECT_EQ(st.corr_hp_fast, 13106);
-    EXPECT_EQ(st.speech_vad_decision, 0);
 }
 
 // After a burst of intermediate speech decisions, the decision stays 1 for
@@ -235,46 +208,6 @@ TEST(Vad2, RealFftMatchesDft) {
     }
 }
 
-TEST(Vad2, SilenceIsInactive) {
-    vad2_state st;
-    vad2_init(&st);
-    Word16 zero[80] = {};
-    for (int i = 0; i < 20; ++i) EXPECT_EQ(vad2(zero, &st), 0);
-    EXPECT_EQ(st.Lframe_cnt, 20);
-}
-
-// A loud onset over a settled noise floor is active, and the detector holds
-// the decision for a hangover after the onset ends.
-TEST(Vad2, OnsetOverNoiseIsActiveWithHangover) {
-    vad2_state st;
-    vad2_init(&st);
-    noise_gen bg(30, 4);
-    Word16 half[80];
-    for (int f = 0; f < 200; ++f) {
-        for (auto &v : half) v = bg();
-        vad2(half, &st);
-    }
-    for (auto &v : half) v = bg();
-    EXPECT_EQ(vad2(half, &st), 0);
-
-    sine_gen voice(300, 10000);
-    int active = 0;
-    for (int f = 0; f < 20; ++f) {
-        for (auto &v : half) v = static_cast<Word16>(voice() + bg());
-        active += vad2(half, &st);
-    }
-    EXPECT_GE(active, 18);
-    for (auto &v : half) v = bg();
-    EXPECT_EQ(vad2(half, &st), 1);   // hangover
-    int tail = 1;
-    for (int f = 0; f < 60; ++f) {
-        for (auto &v : half) v = bg();
-        if (vad2(half, &st) == 0) break;
-        ++tail;
-    }
-    EXPECT_LT(tail, 40);
-}
-
 // ---- the per-frame entry point ----------------------------------------------------
 
 namespace {
@@ -299,24 +232,21 @@ struct encoder_fixture {
 
 }  // namespace
 
-// Option 2 processes both halves of every frame.
-TEST(VadEntry, Option2RunsOnBothHalves) {
-    encoder_fixture e(1);
-    for (int f = 0; f < 3; ++f) e.frame(0, 0);
-    EXPECT_EQ(e.enc.vad.v2.Lframe_cnt, 6);
-}
+// Option 2 (configuration word 1) processes both halves of every frame; any
+// other value runs option 1, on whatever state creation left (all zero for
+// values other than 0).
+TEST(VadEntry, OptionDispatch) {
+    encoder_fixture two(1);
+    for (int f = 0; f < 3; ++f) two.frame(0, 0);
+    EXPECT_EQ(two.enc.vad.v2.Lframe_cnt, 6);
 
-// A configuration word other than 0 or 1 selects option 1 at frame time,
-// running on whatever state creation left (all zero for such a value).
-TEST(VadEntry, OtherOptionValuesRunOptionOne) {
-    encoder_fixture e(2);
+    encoder_fixture other(2);
     vad1_state ref{};
     frame_buf shadow;
     for (int f = 0; f < 5; ++f) {
-        e.frame(2000, 10 + f);
-        std::memcpy(shadow.s, e.enc.old_speech + 120, 200 * sizeof(Word16));
-        const Word16 d = vad1(&ref, shadow.fresh());
-        EXPECT_EQ(e.fr.vad_flag, d);
+        other.frame(2000, 10 + f);
+        std::memcpy(shadow.s, other.enc.old_speech + 120, 200 * sizeof(Word16));
+        EXPECT_EQ(other.fr.vad_flag, vad1(&ref, shadow.fresh()));
     }
-    EXPECT_EQ(std::memcmp(&e.enc.vad.v1, &ref, sizeof ref), 0);
+    EXPECT_EQ(std::memcmp(&other.enc.vad.v1, &ref, sizeof ref), 0);
 }
