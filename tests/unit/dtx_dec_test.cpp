@@ -2,9 +2,11 @@
 // reception state machine and the history kept during speech.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdlib>
 
 #include "dec/dtx_dec.h"
+#include "lpc/tables.h"
 #include "vamrnb.h"
 
 using namespace vamrnb;
@@ -170,4 +172,95 @@ TEST(CnHistory, ActivityUpdateRingsAndMeasuresLevel) {
     // Samples of 2^10: log2 of the power per sample is 20, Q10.
     EXPECT_NEAR(st.log_en_hist[1], 20 * 1024, 2);
     EXPECT_EQ(st.log_en_hist[0], -8521);  // silence
+}
+
+namespace {
+
+// Decoder memories that comfort noise touches, at their reset values.
+struct CnMemories {
+    int16_t lsp_old[10], mem_syn[10] = {}, past_r_q[10] = {}, past_lsf_q[10];
+    int16_t past_qua_en[4] = {-14336, -14336, -14336, -14336};
+    int16_t past_qua_en_MR122[4] = {-2381, -2381, -2381, -2381};
+    int16_t hang_var = 0, hang_count = 5;
+    int16_t synth[160], A_t[44];
+
+    CnMemories() {
+        std::copy_n(vamrnb_tbl_lsp_init_data, 10, lsp_old);
+        std::copy_n(vamrnb_tbl_mean_lsf, 10, past_lsf_q);
+    }
+    cn_links links() {
+        return {lsp_old, mem_syn, past_r_q, past_lsf_q,
+                past_qua_en, past_qua_en_MR122, &hang_var, &hang_count};
+    }
+    double power() const {
+        double p = 0;
+        for (int16_t x : synth) p += double(x) * x;
+        return p / 160;
+    }
+};
+
+// One comfort-noise frame through the state machine and the generator.
+dtx_global_state cn_frame(dtx_dec_state &st, CnMemories &m, int rx, const int16_t *prm) {
+    const auto prev = static_cast<dtx_global_state>(st.dtxGlobalState);
+    const dtx_global_state next = rx_dtx_handler(&st, rx);
+    if (next != SPEECH) dtx_dec(&st, m.links(), prev, next, MR122, prm, m.synth, m.A_t);
+    st.dtxGlobalState = next;
+    return next;
+}
+
+}  // namespace
+
+TEST(CnSynthesis, SidUpdateSetsLevelAndGainPredictors) {
+    const int16_t sid[5] = {3, 100, 200, 300, 40};
+    dtx_dec_state st = fresh();
+    CnMemories m;
+    ASSERT_EQ(cn_frame(st, m, RX_SID_UPDATE, sid), DTX);
+    EXPECT_EQ(st.log_en, 40 * 512 - 5120);
+    EXPECT_EQ(st.old_log_en, st.log_en);  // nothing to interpolate from yet
+    EXPECT_EQ(st.data_updated, 1);
+    EXPECT_EQ(st.since_last_sid, 0);
+    const int16_t pred = 7680 - 9000;
+    for (int i = 0; i < 4; ++i) {
+        EXPECT_EQ(m.past_qua_en[i], pred);
+        EXPECT_EQ(m.past_qua_en_MR122[i], (5443 * pred) >> 15);
+        EXPECT_EQ(m.past_r_q[i], 0);  // cleared for the next speech frame
+    }
+    EXPECT_EQ(m.hang_var, 20);
+    EXPECT_EQ(m.hang_count, 0);
+    for (int s = 1; s < 4; ++s)
+        for (int i = 0; i < 11; ++i) EXPECT_EQ(m.A_t[11 * s + i], m.A_t[i]);
+    EXPECT_EQ(m.A_t[0], 4096);
+}
+
+TEST(CnSynthesis, LevelFollowsEnergyIndexAndMutingFades) {
+    double power[3];
+    const int16_t index[3] = {0, 20, 50};
+    for (int k = 0; k < 3; ++k) {
+        const int16_t sid[5] = {0, 50, 60, 70, index[k]};
+        dtx_dec_state st = fresh();
+        CnMemories m;
+        cn_frame(st, m, RX_SID_UPDATE, sid);
+        for (int f = 0; f < 4; ++f) cn_frame(st, m, RX_NO_DATA, sid);
+        power[k] = m.power();
+    }
+    EXPECT_LT(power[0], 1.0);  // index 0 is silence
+    EXPECT_GT(power[1], 1.0);
+    // 30 index steps of 1.5 dB each: a quarter of log2 in amplitude.
+    EXPECT_NEAR(power[2] / power[1], 32768.0, 0.1 * 32768.0);
+
+    // Without updates the noise is muted after 50 frames and fades 1/8 of
+    // log2 per frame.
+    const int16_t sid[5] = {0, 50, 60, 70, 50};
+    dtx_dec_state st = fresh();
+    CnMemories m;
+    cn_frame(st, m, RX_SID_UPDATE, sid);
+    int f = 0;
+    while (cn_frame(st, m, RX_NO_DATA, sid) == DTX) ++f;
+    EXPECT_EQ(f, 50);
+    const int16_t before = st.old_log_en;
+    EXPECT_EQ(st.log_en, before - 256);
+    EXPECT_EQ(cn_frame(st, m, RX_NO_DATA, sid), DTX_MUTE);
+    EXPECT_EQ(st.log_en, before - 512);
+    EXPECT_EQ(cn_frame(st, m, RX_SID_UPDATE, sid), DTX);  // a fresh update lifts it
+    EXPECT_EQ(st.log_en, 50 * 512 - 5120);
 }
