@@ -22,6 +22,8 @@ using ResiduFn = void (*)(const Word16 *a, const Word16 *x, Word16 *y);
 using PredLtFn = void (*)(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
 using EnergyFn = Word32 (*)(const Word16 *x, Word32 n, Word32 init);
 using InnerProductFn = Word32 (*)(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+using CompCorrFn = void (*)(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
+using ConvolveFn = void (*)(const Word16 *x, const Word16 *h, Word16 *y);
 
 struct DspKernels {
     SynFiltFn syn_filt;
@@ -30,6 +32,12 @@ struct DspKernels {
     PredLtFn pred_lt_3or6;
     EnergyFn energy;
     InnerProductFn inner_product;
+    // Encoder kernels whose portable versions live with the encoder stages:
+    // null in the portable set, so that the owner's exported function runs
+    // its own loop; otherwise a vector version with identical results that
+    // the exported function hands the call to.
+    CompCorrFn comp_corr;   // as vamrnbe_comp_corr
+    ConvolveFn convolve;    // as vamrnbe_convolve
 };
 
 // The kernel set in use (selected on first call).
@@ -58,7 +66,11 @@ void residu_sse41(const Word16 *a, const Word16 *x, Word16 *y);
 void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
 Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init);
 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
+void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y);
 void residu_avx2(const Word16 *a, const Word16 *x, Word16 *y);
+void comp_corr_avx2(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
+void convolve_avx2(const Word16 *x, const Word16 *h, Word16 *y);
 void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
 #endif
 
@@ -70,6 +82,8 @@ void residu_neon(const Word16 *a, const Word16 *x, Word16 *y);
 void pred_lt_3or6_neon(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
 Word32 energy_neon(const Word16 *x, Word32 n, Word32 init);
 Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
+void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y);
 #endif
 
 }  // namespace vamrnb

@@ -9,6 +9,8 @@
 #include <string>
 #include <vector>
 
+#include "enc/enc_state.h"
+#include "enc/subframe.h"
 #include "lpc/dsp.h"
 #include "lpc/lpc.h"
 #include "vamrnb.h"
@@ -177,5 +179,44 @@ TEST(Checkasm, CpuMaskSwitchesVersions) {
     EXPECT_EQ(&dsp(), &dsp_for(~0u));
     vamrnb_syn_filt(a, x, mem, y1);
     EXPECT_EQ(0, std::memcmp(y0, y1, sizeof y0));
+    vamrnb_set_cpu_flags(before);
+}
+
+// Encoder kernels: the vector hooks against the encoder's own portable
+// functions (called with vector code switched off).
+TEST(Checkasm, EncoderCorrelations) {
+    const auto vs = versions();
+    if (vs.empty()) GTEST_SKIP() << "no vector versions on this processor";
+    const uint32_t before = vamrnb_set_cpu_flags(0);
+    Gen g(106);
+    for (int t = 0; t < 300; ++t) {
+        int16_t sig[143 + 160];
+        g.fill(sig, 303, t % 4 == 1 ? 2 : t);
+        if (t % 3 == 0)
+            for (auto &v : sig) v = static_cast<int16_t>(v >> 4);
+        const int32_t len = t % 2 ? 160 : 80;
+        const int32_t lag_min = 18 + t % 5;
+        int32_t ref[144] = {}, out[144] = {};
+        const int16_t *x = sig + 143;
+        vamrnbe_comp_corr(x, len, 143, lag_min, ref + 143);
+        for (const auto &v : vs) {
+            if (!v.k->comp_corr) continue;
+            v.k->comp_corr(x, len, 143, lag_min, out + 143);
+            ASSERT_EQ(0, std::memcmp(out, ref, sizeof out)) << v.name << " t=" << t;
+        }
+    }
+    for (int t = 0; t < 3000; ++t) {
+        int16_t x[40], h[40], ref[40];
+        g.fill(x, 40, t);
+        g.fill(h, 40, t / 4 + 2);
+        if (t % 5 == 0) h[0] = 4096;
+        vamrnbe_convolve(x, h, ref);
+        for (const auto &v : vs) {
+            if (!v.k->convolve) continue;
+            int16_t out[40];
+            v.k->convolve(x, h, out);
+            ASSERT_EQ(0, std::memcmp(out, ref, sizeof out)) << v.name << " t=" << t;
+        }
+    }
     vamrnb_set_cpu_flags(before);
 }

@@ -9,6 +9,7 @@
 
 #include <arm_neon.h>
 
+#include "lpc/enc_kernels.h"
 #include "lpc/lpc.h"
 #include "lpc/syn_core.h"
 #include "lpc/tables.h"
@@ -155,6 +156,50 @@ Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 ini
     if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return inner_product_c(x, y, n, init);
     const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
     return static_cast<Word32>(init + 2 * total);
+}
+
+namespace {
+
+Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
+    int32x4_t acc = vdupq_n_s32(0);
+    Word32 j = 0;
+    for (; j + 8 <= n; j += 8) {
+        const int16x8_t a = vld1q_s16(x + j), b = vld1q_s16(y + j);
+        acc = vmlal_s16(acc, vget_low_s16(a), vget_low_s16(b));
+        acc = vmlal_s16(acc, vget_high_s16(a), vget_high_s16(b));
+    }
+    const int32x2_t p = vadd_s32(vget_low_s32(acc), vget_high_s32(acc));
+    int64_t s = int64_t{vget_lane_s32(p, 0)} + vget_lane_s32(p, 1);
+    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
+    return static_cast<Word32>(2 * s);
+}
+
+}  // namespace
+
+void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr) {
+    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
+}
+
+// Eight outputs per step; h is read through a copy with 40 zeros in front so
+// that terms past the causal limit vanish.
+void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y) {
+    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
+        enc_kernel::convolve_sat(x, h, y);
+        return;
+    }
+    Word16 hp[2 * L_SUBFR] = {};
+    for (int i = 0; i < L_SUBFR; ++i) hp[L_SUBFR + i] = h[i];
+    for (int n = 0; n < L_SUBFR; n += 8) {
+        int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
+        for (int i = 0; i <= n + 7 && i < L_SUBFR; ++i) {
+            lo = vmlal_n_s16(lo, vld1_s16(hp + L_SUBFR + n - i), x[i]);
+            hi = vmlal_n_s16(hi, vld1_s16(hp + L_SUBFR + n + 4 - i), x[i]);
+        }
+        Word32 s[8];
+        vst1q_s32(s, lo);
+        vst1q_s32(s + 4, hi);
+        for (int k = 0; k < 8; ++k) y[n + k] = enc_kernel::convolve_out(wrap_shl(s[k], 1));
+    }
 }
 
 }  // namespace vamrnb

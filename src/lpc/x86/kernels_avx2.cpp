@@ -8,6 +8,7 @@
 
 #include <immintrin.h>
 
+#include "lpc/enc_kernels.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 
@@ -83,6 +84,54 @@ VAMRNB_AVX2 void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 
             s = sat_add(s, dmul(load8(x0 + j + 1 + i), c2[i]));
         }
         store_round8(exc + j, s);
+    }
+}
+
+namespace {
+
+VAMRNB_AVX2 Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
+    __m256i acc = _mm256_setzero_si256();
+    Word32 j = 0;
+    for (; j + 16 <= n; j += 16)
+        acc = _mm256_add_epi32(
+            acc, _mm256_madd_epi16(_mm256_loadu_si256(reinterpret_cast<const __m256i *>(x + j)),
+                                   _mm256_loadu_si256(reinterpret_cast<const __m256i *>(y + j))));
+    __m128i v = _mm_add_epi32(_mm256_castsi256_si128(acc), _mm256_extracti128_si256(acc, 1));
+    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(1, 0, 3, 2)));
+    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(2, 3, 0, 1)));
+    int64_t s = _mm_cvtsi128_si32(v);
+    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
+    return static_cast<Word32>(2 * s);
+}
+
+}  // namespace
+
+VAMRNB_AVX2 void comp_corr_avx2(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min,
+                                Word32 *corr) {
+    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
+}
+
+// Eight outputs per step (see the SSE4.1 version).
+VAMRNB_AVX2 void convolve_avx2(const Word16 *x, const Word16 *h, Word16 *y) {
+    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
+        enc_kernel::convolve_sat(x, h, y);
+        return;
+    }
+    alignas(32) Word16 hp[2 * L_SUBFR + 8] = {};
+    for (int i = 0; i < L_SUBFR; ++i) hp[L_SUBFR + i] = h[i];
+    for (int n = 0; n < L_SUBFR; n += 8) {
+        __m256i acc = _mm256_setzero_si256();
+        for (int i = 0; i <= n + 7 && i < L_SUBFR; i += 2) {
+            const __m128i h0 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i));
+            const __m128i h1 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i - 1));
+            const __m256i hh = _mm256_set_m128i(_mm_unpackhi_epi16(h0, h1), _mm_unpacklo_epi16(h0, h1));
+            const int32_t xp = static_cast<int32_t>(static_cast<uint16_t>(x[i]) |
+                                                    (static_cast<uint32_t>(static_cast<uint16_t>(x[i + 1])) << 16));
+            acc = _mm256_add_epi32(acc, _mm256_madd_epi16(hh, _mm256_set1_epi32(xp)));
+        }
+        alignas(32) Word32 s[8];
+        _mm256_store_si256(reinterpret_cast<__m256i *>(s), acc);
+        for (int k = 0; k < 8; ++k) y[n + k] = enc_kernel::convolve_out(wrap_shl(s[k], 1));
     }
 }
 

@@ -10,6 +10,7 @@
 
 #include <immintrin.h>
 
+#include "lpc/enc_kernels.h"
 #include "lpc/lpc.h"
 #include "lpc/syn_core.h"
 #include "lpc/tables.h"
@@ -203,6 +204,61 @@ VAMRNB_SSE41 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32
     if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return inner_product_c(x, y, n, init);
     const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
     return static_cast<Word32>(init + 2 * total);
+}
+
+namespace {
+
+VAMRNB_SSE41 inline int32_t hsum(__m128i v) {
+    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(1, 0, 3, 2)));
+    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(2, 3, 0, 1)));
+    return _mm_cvtsi128_si32(v);
+}
+
+// 2·sum x·y in any order; only for sums known not to saturate.
+VAMRNB_SSE41 Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
+    __m128i acc = _mm_setzero_si128();
+    Word32 j = 0;
+    for (; j + 8 <= n; j += 8)
+        acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_loadu_si128(reinterpret_cast<const __m128i *>(x + j)),
+                                                _mm_loadu_si128(reinterpret_cast<const __m128i *>(y + j))));
+    int64_t s = hsum(acc);
+    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
+    return static_cast<Word32>(2 * s);
+}
+
+// Pair (lo, hi) of 16-bit values replicated in every 32-bit lane.
+VAMRNB_SSE41 inline __m128i pair16(Word16 lo, Word16 hi) {
+    return _mm_set1_epi32(static_cast<int32_t>(static_cast<uint16_t>(lo) |
+                                               (static_cast<uint32_t>(static_cast<uint16_t>(hi)) << 16)));
+}
+
+}  // namespace
+
+VAMRNB_SSE41 void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min,
+                                  Word32 *corr) {
+    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
+}
+
+// Four outputs per step; h is read through a copy with 40 zeros in front so
+// that terms past the causal limit vanish.
+VAMRNB_SSE41 void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y) {
+    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
+        enc_kernel::convolve_sat(x, h, y);
+        return;
+    }
+    alignas(16) Word16 hp[2 * L_SUBFR + 8] = {};
+    for (int i = 0; i < L_SUBFR; ++i) hp[L_SUBFR + i] = h[i];
+    for (int n = 0; n < L_SUBFR; n += 4) {
+        __m128i acc = _mm_setzero_si128();
+        for (int i = 0; i <= n + 3 && i < L_SUBFR; i += 2) {
+            const __m128i h0 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i));
+            const __m128i h1 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i - 1));
+            acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_unpacklo_epi16(h0, h1), pair16(x[i], x[i + 1])));
+        }
+        alignas(16) Word32 s[4];
+        _mm_store_si128(reinterpret_cast<__m128i *>(s), acc);
+        for (int k = 0; k < 4; ++k) y[n + k] = enc_kernel::convolve_out(wrap_shl(s[k], 1));
+    }
 }
 
 }  // namespace vamrnb

@@ -1,0 +1,63 @@
+// Shared logic of the vector versions of the encoder's correlation kernels.
+// Those kernels accumulate with saturation in sequence; a vector version may
+// sum in any order only when no partial sum can reach the 32-bit rails.  By
+// Cauchy-Schwarz every partial sum of 2·x[j]·y[j] is bounded by
+// 2·sqrt(sum x^2 · sum y^2), so when 4·Ex·Ey stays below 2^62 - 2^33 the
+// exact sum is the saturating one.
+#pragma once
+
+#include <cstdint>
+
+#include "basic_op/basic_op.h"
+
+namespace vamrnb::enc_kernel {
+
+// True when a dot product of vectors with energies ex and ey (sums of
+// squares, exact) cannot saturate at any step.  Decided in double with a
+// margin far above its rounding error.
+inline bool no_saturation(int64_t ex, int64_t ey) {
+    constexpr double kLimit = 4.6e18;   // below (2^31 - 1)^2 = 4.6117e18
+    return 4.0 * static_cast<double>(ex) * static_cast<double>(ey) < kLimit;
+}
+
+inline int64_t sum_sq(const Word16 *x, int n) {
+    int64_t s = 0;
+    for (int i = 0; i < n; ++i) s += int64_t{x[i]} * x[i];
+    return s;
+}
+
+// The sequential saturating forms, for inputs that fail the test.
+inline Word32 dot_sat(const Word16 *x, const Word16 *y, int n) {
+    Word32 t = 0;
+    for (int j = 0; j < n; ++j) t = l_mac(t, x[j], y[j]);
+    return t;
+}
+
+// Open-loop correlations: corr[-lag] for lag_max down to lag_min; exact_dot
+// forms 2·sum x·y without saturation (only called when that is safe).
+template <class ExactDot>
+inline void comp_corr(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr,
+                      ExactDot exact_dot) {
+    const int64_t ex = sum_sq(x, len);
+    int64_t ed = sum_sq(x - lag_max, len);
+    for (Word32 lag = lag_max; lag >= lag_min; --lag) {
+        const Word16 *d = x - lag;
+        corr[-lag] = no_saturation(ex, ed) ? exact_dot(x, d, len) : dot_sat(x, d, len);
+        // Window of the next (shorter) lag: drop x[-lag], take in x[len-lag].
+        ed += int64_t{x[len - lag]} * x[len - lag] - int64_t{x[-lag]} * x[-lag];
+    }
+}
+
+// Convolution output of an exact sum: saturating shift by 3, high half.
+inline Word16 convolve_out(Word32 s) { return extract_h(l_shl(s, 3)); }
+
+// Sequential form of the convolution (x, h, y: 40 samples).
+inline void convolve_sat(const Word16 *x, const Word16 *h, Word16 *y) {
+    for (int n = 0; n < 40; ++n) {
+        Word32 s = 0;
+        for (int i = 0; i <= n; ++i) s = l_mac(s, x[i], h[n - i]);
+        y[n] = convolve_out(s);
+    }
+}
+
+}  // namespace vamrnb::enc_kernel
