@@ -25,6 +25,32 @@ inline Word16 div_q15(Word16 num, Word16 den) {
     return div_s(num, den);
 }
 
+// One sample of total excitation: round(sat(2 x pf + 2 c g) << shift) with
+// the saturation of each step; pf and g are never negative, so the two
+// products fit in 32 bits.
+inline Word16 mix_sample(Word16 x, Word16 pf, Word16 c, Word16 g, Word16 shift) {
+    int64_t L = sat32(2 * (int64_t{x} * pf) + 2 * (int64_t{c} * g));
+    L = sat32(L << shift);
+    return static_cast<Word16>(sat32(L + 0x8000) >> 16);
+}
+
+// dst[k] = add(dst[k], mult(amp, r[k])) for k < n.
+inline void add_scaled(Word16 *dst, const Word16 *r, int n, Word16 amp) {
+    for (int k = 0; k < n; ++k) {
+        int32_t m = (int32_t{amp} * r[k]) >> 15;
+        m = m > 32767 ? 32767 : m;
+        const int32_t v = dst[k] + m;
+        dst[k] = static_cast<Word16>(v > 32767 ? 32767 : (v < -32768 ? -32768 : v));
+    }
+}
+
+// sig[i] = extract_h(l_shl(l_mult(sig[i], g), 3)) for a gain g >= 0, that is
+// the product shifted down by 12 and saturated.
+inline Word16 scale_q12(Word16 x, int32_t g) {
+    const int32_t v = (int32_t{x} * g) >> 12;
+    return static_cast<Word16>(v > 32767 ? 32767 : (v < -32768 ? -32768 : v));
+}
+
 // Energy of a 40-sample vector with the input scaled down by 4.
 Word32 energy_scaled(const Word16 *x) {
     Word16 t = shr(x[0], 2);
@@ -132,17 +158,12 @@ void ph_disp(dec_state *st, int32_t mode, Word16 *x, Word16 cb_gain, Word16 ltp_
         for (int k = 0; k < nze; ++k) {
             const int pos = where[k];
             const Word16 amp = saved[pos];
-            int j = 0;
-            for (int i = pos; i < L_SUBFR; ++i) inno[i] = add(inno[i], mult(amp, resp[j++]));
-            for (int i = 0; i < pos; ++i) inno[i] = add(inno[i], mult(amp, resp[j++]));
+            add_scaled(inno + pos, resp, L_SUBFR - pos, amp);
+            add_scaled(inno, resp + L_SUBFR - pos, pos, amp);
         }
     }
 
-    for (int i = 0; i < L_SUBFR; ++i) {
-        Word32 L = l_mult(x[i], pitch_fac);
-        L = l_mac(L, inno[i], cb_gain);
-        x[i] = round16(l_shl(L, tmp_shift));
-    }
+    for (int i = 0; i < L_SUBFR; ++i) x[i] = mix_sample(x[i], pitch_fac, inno[i], cb_gain, tmp_shift);
 }
 
 // Excitation energy control: scales the excitation down to the median of the
@@ -185,7 +206,7 @@ void agc2(const Word16 *ref, Word16 *sig) {
         s = vamrnb_inv_sqrt(s);
         g0 = round16(l_shl(s, 9));
     }
-    for (int i = 0; i < L_SUBFR; ++i) sig[i] = extract_h(l_shl(l_mult(sig[i], g0), 3));
+    for (int i = 0; i < L_SUBFR; ++i) sig[i] = scale_q12(sig[i], g0);
 }
 
 }  // namespace vamrnb
@@ -257,9 +278,7 @@ extern "C" void vamrnbd_excit(dec_state *st, dec_work *w, int32_t i_subfr) {
     // kept for the synthesis excitation
     for (int i = 0; i < L_SUBFR; ++i) {
         enh[i] = exc[i];
-        Word32 L = l_mult(exc[i], pitch_fac);
-        L = l_mac(L, w->code[i], w->gain_code);
-        exc[i] = round16(l_shl(L, tmp_shift));
+        exc[i] = mix_sample(exc[i], pitch_fac, w->code[i], w->gain_code, tmp_shift);
     }
 
     st->lockFull = (low_mode(mode) && st->voicedHangover > 3 && st->inBackgroundNoise != 0 && bfi != 0)

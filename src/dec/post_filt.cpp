@@ -39,33 +39,58 @@ void agc(post_filter_state *st, const Word16 *in, Word16 *out) {
         s = vamrnb_inv_sqrt(s);
         g0 = mult(round16(l_shl(s, 9)), sub(32767, AGC_FAC));
     }
+    // smoothed gain per sample (never negative), then the scaling:
+    // extract_h(l_shl(l_mult(x, g), 3)) is x g shifted down by 12, saturated
+    Word16 gains[L_SUBFR];
     Word16 gain = st->past_gain;
+    for (int i = 0; i < L_SUBFR; ++i) gains[i] = gain = add(mult(gain, AGC_FAC), g0);
     for (int i = 0; i < L_SUBFR; ++i) {
-        gain = add(mult(gain, AGC_FAC), g0);
-        out[i] = extract_h(l_shl(l_mult(out[i], gain), 3));
+        const int32_t v = (int32_t{out[i]} * gains[i]) >> 12;
+        out[i] = static_cast<Word16>(v > 32767 ? 32767 : (v < -32768 ? -32768 : v));
     }
     st->past_gain = gain;
 }
 
 // Output high-pass filter (second order, 60 Hz) with doubling of the signal.
+// The recursive part keeps its past outputs as (hi, lo) pairs.  With these
+// coefficients the feedback products and their sum cannot saturate, so they
+// are formed directly; the feed-forward terms and the output scaling keep
+// their saturation, taken on a slow path only when a sum leaves 32 bits.
 void post_process(post_filter_state *st, Word16 *sig) {
-    const Word16 *a = tab::post_pro_a;
-    const Word16 *b = tab::post_pro_b;
+    const int32_t a1 = tab::post_pro_a[1], a2 = tab::post_pro_a[2];
+    const int32_t b0 = tab::post_pro_b[0], b1 = tab::post_pro_b[1], b2 = tab::post_pro_b[2];
+    int32_t y1_hi = st->y1_hi, y1_lo = st->y1_lo, y2_hi = st->y2_hi, y2_lo = st->y2_lo;
+    int32_t x0 = st->x0, x1 = st->x1;
     for (int i = 0; i < L_FRAME; ++i) {
-        const Word16 x2 = st->x1;
-        st->x1 = st->x0;
-        st->x0 = sig[i];
-        Word32 L = mpy_32_16(st->y1_hi, st->y1_lo, a[1]);
-        L = l_add(L, mpy_32_16(st->y2_hi, st->y2_lo, a[2]));
-        L = l_mac(L, st->x0, b[0]);
-        L = l_mac(L, st->x1, b[1]);
-        L = l_mac(L, x2, b[2]);
-        L = l_shl(L, 2);
-        sig[i] = round16(l_shl(L, 1));
-        st->y2_hi = st->y1_hi;
-        st->y2_lo = st->y1_lo;
-        l_extract(L, &st->y1_hi, &st->y1_lo);
+        const int32_t x2 = x1;
+        x1 = x0;
+        x0 = sig[i];
+        const int32_t fb = 2 * (y1_hi * a1 + ((y1_lo * a1) >> 15)) +
+                           2 * (y2_hi * a2 + ((y2_lo * a2) >> 15));
+        const int64_t p1 = int64_t{fb} + 2 * x0 * b0;
+        const int64_t p2 = p1 + 2 * x1 * b1;
+        const int64_t p3 = p2 + 2 * x2 * b2;
+        Word32 L;
+        if (p1 == sat32(p1) && p2 == sat32(p2) && p3 == sat32(p3)) {
+            L = static_cast<Word32>(p3);
+        } else {
+            L = l_mac(l_mac(l_mac(fb, static_cast<Word16>(x0), static_cast<Word16>(b0)),
+                            static_cast<Word16>(x1), static_cast<Word16>(b1)),
+                      static_cast<Word16>(x2), static_cast<Word16>(b2));
+        }
+        L = sat32(int64_t{L} * 4);
+        sig[i] = round16(sat32(int64_t{L} * 2));
+        y2_hi = y1_hi;
+        y2_lo = y1_lo;
+        y1_hi = L >> 16;
+        y1_lo = (L >> 1) & 0x7FFF;
     }
+    st->y1_hi = static_cast<Word16>(y1_hi);
+    st->y1_lo = static_cast<Word16>(y1_lo);
+    st->y2_hi = static_cast<Word16>(y2_hi);
+    st->y2_lo = static_cast<Word16>(y2_lo);
+    st->x0 = static_cast<Word16>(x0);
+    st->x1 = static_cast<Word16>(x1);
 }
 
 }  // namespace
