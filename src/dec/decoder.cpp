@@ -16,11 +16,6 @@
 
 using namespace vamrnb;
 
-// Until the comfort-noise stage is part of the library, speech is decoded
-// without it: the parameters come straight from the serial bits.
-extern "C" void vamrnbd_dtx(dec_state *, dec_work *, const int16_t **) __attribute__((weak));
-extern "C" void vamrnbd_dtx_dec_activity_update(dec_state *, dec_work *) __attribute__((weak));
-
 namespace {
 
 constexpr Word16 HOMING_SAMPLE = 0x0008;
@@ -68,17 +63,6 @@ void substitute_params(Word16 *seed, int32_t mode, Word16 *prm) {
     const int16_t *width = vamrnb_tbl_bitno[mode];
     for (int i = 0; i < vamrnb_tbl_prmno[mode]; ++i)
         prm[i] = static_cast<Word16>(p[i] & ((1 << width[i]) - 1));
-}
-
-void speech_params(dec_state *st, dec_work *w, const int16_t **cursor) {
-    if (vamrnbd_dtx != nullptr) {
-        vamrnbd_dtx(st, w, cursor);
-        return;
-    }
-    vamrnbd_bits2prm(st->prev_mode, w->serial, w->prm);
-    *cursor = w->prm;
-    w->dtx_state_prev = st->cn.dtxGlobalState;
-    st->cn.dtxGlobalState = SPEECH;
 }
 
 }  // namespace
@@ -269,7 +253,7 @@ extern "C" int32_t vamrnbd_decode(vamrnb_decoder *dec, const bitstream_buffer *i
         w->serial = serial;
         w->dtx_state_prev = st->cn.dtxGlobalState;
         const int16_t *cursor = w->prm;
-        speech_params(st, w, &cursor);
+        vamrnbd_dtx(st, w, &cursor);
         if (vamrnbd_lsp(st, w, &cursor) != 2) {
             std::memcpy(w->synth_buf, st->mem_syn, sizeof st->mem_syn);
             w->Az_cur = w->Az;
@@ -287,7 +271,7 @@ extern "C" int32_t vamrnbd_decode(vamrnb_decoder *dec, const bitstream_buffer *i
             std::memcpy(st->mem_syn, w->synth_buf + L_FRAME, sizeof st->mem_syn);
             st->inBackgroundNoise =
                 vamrnbd_bgn_scd(st, st->ltpGainHistory, dec_synth(w), &st->voicedHangover);
-            if (vamrnbd_dtx_dec_activity_update != nullptr) vamrnbd_dtx_dec_activity_update(st, w);
+            vamrnbd_dtx_dec_activity_update(st, w);
             st->prev_bf = w->bfi;
             st->prev_pdf = w->pdfi;
             vamrnbd_lsp_avg(st->past_lsf_q, st->lsp_meanSave);
