@@ -68,8 +68,8 @@ Word32 abs_sum(Word32 acc, const Word16 *data, int first, int last, int step, in
     return acc;
 }
 
-// One stage of the bank: a pair of first-order all-pass sections whose sum
-// and difference are the low and high half bands.
+// Low and high half-band outputs of one split.  Each split filters its two
+// inputs through all-pass sections; their sum and difference are the halves.
 struct allpass_pair_out { Word16 lo, hi; };
 
 // 5th-order split of x0 (through section a) and x1 (through section b) with

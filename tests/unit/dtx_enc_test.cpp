@@ -195,3 +195,51 @@ TEST(DtxSid, NewParametersSeedThePredictor) {
         }
     }
 }
+
+// ---- through the public encoder ---------------------------------------------------
+
+namespace {
+
+struct api_encoder {
+    vamrnb_encoder *enc;
+    explicit api_encoder(int vad_option, int mode) {
+        const codec_config c = {{1, 0, vad_option, mode}};
+        int32_t status = -1;
+        enc = vamrnbe_create(&c, &status);
+        EXPECT_EQ(status, 0);
+    }
+    ~api_encoder() { vamrnbe_delete(enc); }
+    std::vector<uint8_t> silent_frame() {
+        int16_t pcm[160] = {};
+        pcm_buffer in{};
+        in.data[0] = pcm;
+        uint8_t out[64];
+        bitstream_buffer b{out, 0, sizeof out};
+        frame_info info{};
+        vamrnbe_encode(enc, &in, &b, &info);
+        return std::vector<uint8_t>(out, out + info.bytes);
+    }
+};
+
+}  // namespace
+
+// Digital silence from the first frame on, with either detector: seven speech
+// frames, then SID_FIRST, no data, no data, SID_UPDATE.  Every SID names the
+// configured mode, also after a mode change during the silence.
+TEST(DtxEncoder, SilenceFromTheStart) {
+    for (int vad_option : {0, 1}) {
+        api_encoder e(vad_option, 5);
+        for (int f = 0; f < 7; ++f) EXPECT_EQ(e.silent_frame().size(), 21u) << f;
+        auto sid = e.silent_frame();
+        ASSERT_EQ(sid.size(), 6u);
+        EXPECT_EQ(sid[0], 0x44);
+        EXPECT_EQ(sid[5] & 0x1e, 0x0a);   // STI 0, mode 5 sent as 1, 0, 1
+        EXPECT_EQ(e.silent_frame(), std::vector<uint8_t>{0x7c});
+        EXPECT_EQ(e.silent_frame(), std::vector<uint8_t>{0x7c});
+        vamrnbe_set_mode(e.enc, 2);
+        auto upd = e.silent_frame();
+        ASSERT_EQ(upd.size(), 6u);
+        EXPECT_EQ(upd[5] & 0x1e, 0x14);   // STI 1, mode 2 sent as 0, 1, 0
+        EXPECT_TRUE(std::equal(sid.begin() + 1, sid.begin() + 5, upd.begin() + 1));
+    }
+}
