@@ -10,6 +10,7 @@
 #include "enc/subframe.h"
 #include "lpc/dsp.h"
 #include "lpc/lpc.h"
+#include "lpc/tables.h"
 
 using namespace vamrnb;
 
@@ -138,6 +139,19 @@ void BM_convolve(benchmark::State &state) {
     vamrnb_set_cpu_flags(before);
 }
 
+void BM_vq_subvec4_512(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    const int16_t w[4] = {3000, 2800, 2500, 2000};
+    const uint32_t before = vamrnb_set_cpu_flags(static_cast<uint32_t>(state.range(0)));
+    for (auto _ : state) {
+        int16_t r[4] = {120, -340, 55, 17};
+        benchmark::DoNotOptimize(k->vq_subvec4 ? k->vq_subvec4(r, tab::q_plsf_3_dico3_lsf, w, 512)
+                                               : vamrnbe_vq_subvec4(r, tab::q_plsf_3_dico3_lsf, w, 512));
+    }
+    vamrnb_set_cpu_flags(before);
+}
+
 void sets(benchmark::internal::Benchmark *b) {
     b->ArgName("cpu");
     for (int64_t flags : {int64_t{0}, int64_t{kCpuSse41}, int64_t{kCpuAvx2 | kCpuSse41}, int64_t{kCpuNeon}})
@@ -154,3 +168,4 @@ BENCHMARK(BM_energy)->Apply(sets);
 BENCHMARK(BM_inner_product)->Apply(sets);
 BENCHMARK(BM_comp_corr)->Apply(sets);
 BENCHMARK(BM_convolve)->Apply(sets);
+BENCHMARK(BM_vq_subvec4_512)->Apply(sets);

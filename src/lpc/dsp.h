@@ -24,6 +24,9 @@ using EnergyFn = Word32 (*)(const Word16 *x, Word32 n, Word32 init);
 using InnerProductFn = Word32 (*)(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
 using CompCorrFn = void (*)(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
 using ConvolveFn = void (*)(const Word16 *x, const Word16 *h, Word16 *y);
+using VqSubvecFn = int16_t (*)(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                               const Word16 *w2, Word32 size);
+using VqSubvec4Fn = int16_t (*)(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
 
 struct DspKernels {
     SynFiltFn syn_filt;
@@ -38,6 +41,9 @@ struct DspKernels {
     // the exported function hands the call to.
     CompCorrFn comp_corr;   // as vamrnbe_comp_corr
     ConvolveFn convolve;    // as vamrnbe_convolve
+    VqSubvecFn vq_subvec;   // as vamrnbe_vq_subvec
+    VqSubvecFn vq_subvec_s; // as vamrnbe_vq_subvec_s
+    VqSubvec4Fn vq_subvec4; // as vamrnbe_vq_subvec4
 };
 
 // The kernel set in use (selected on first call).
@@ -68,6 +74,11 @@ Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init);
 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
 void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
 void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y);
+int16_t vq_subvec_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                        const Word16 *w2, Word32 size);
+int16_t vq_subvec_s_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                          const Word16 *w2, Word32 size);
+int16_t vq_subvec4_sse41(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
 void residu_avx2(const Word16 *a, const Word16 *x, Word16 *y);
 void comp_corr_avx2(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
 void convolve_avx2(const Word16 *x, const Word16 *h, Word16 *y);
@@ -84,6 +95,11 @@ Word32 energy_neon(const Word16 *x, Word32 n, Word32 init);
 Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
 void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
 void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y);
+int16_t vq_subvec_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                       const Word16 *w2, Word32 size);
+int16_t vq_subvec_s_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                         const Word16 *w2, Word32 size);
+int16_t vq_subvec4_neon(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
 #endif
 
 }  // namespace vamrnb

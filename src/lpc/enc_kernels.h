@@ -60,4 +60,70 @@ inline void convolve_sat(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+// ---- split-VQ searches ------------------------------------------------------
+// A 4-component row search: the weighted distance of (r - row) (or of
+// (r + row) for the negated rows of the signed search) is
+// sum 2·mult(w[k], diff[k])^2, saturating; the first row with the strictly
+// smallest distance wins, the row before its negation.
+
+struct VqPick {
+    int index;
+    int sign;   // 1: the negated row
+    Word32 dist;
+};
+
+inline Word32 vq_dist(const Word16 r[4], const Word16 w[4], const Word16 *row, bool negated) {
+    Word32 d = 0;
+    for (int k = 0; k < 4; ++k) {
+        const Word16 t = mult(w[k], negated ? add(r[k], row[k]) : sub(r[k], row[k]));
+        d = l_mac(d, t, t);
+    }
+    return d;
+}
+
+// Continues a search over rows [from, size) after a vector part that ended
+// with `best`.
+inline VqPick vq_tail(const Word16 r[4], const Word16 w[4], const Word16 *dico, int from, int size,
+                      bool is_signed, VqPick best) {
+    for (int i = from; i < size; ++i) {
+        const Word16 *row = dico + 4 * i;
+        Word32 d = vq_dist(r, w, row, false);
+        if (d < best.dist) best = {i, 0, d};
+        if (is_signed) {
+            d = vq_dist(r, w, row, true);
+            if (d < best.dist) best = {i, 1, d};
+        }
+    }
+    return best;
+}
+
+// Lane results to one pick: the smallest distance, the lowest row among
+// equal distances.
+inline VqPick vq_join(const Word32 dist[4], const int32_t index[4], const int32_t sign[4]) {
+    VqPick p{0, 0, MAX_32};
+    bool any = false;
+    for (int k = 0; k < 4; ++k) {
+        if (index[k] < 0) continue;   // lane never improved on the start value
+        if (!any || dist[k] < p.dist || (dist[k] == p.dist && index[k] < p.index)) {
+            p = {index[k], sign[k], dist[k]};
+            any = true;
+        }
+    }
+    return p;
+}
+
+// The chosen row (negated for sign 1) written back over the residuals; the
+// returned code is the row index, doubled plus the sign for the signed search.
+inline int16_t vq_finish(Word16 *r1, Word16 *r2, const Word16 *dico, VqPick p, bool is_signed) {
+    const Word16 *pick = dico + 4 * p.index;
+    Word16 v[4];
+    for (int k = 0; k < 4; ++k) v[k] = p.sign ? negate(pick[k]) : pick[k];
+    r1[0] = v[0];
+    r1[1] = v[1];
+    r2[0] = v[2];
+    r2[1] = v[3];
+    return is_signed ? add(shl(static_cast<Word16>(p.index), 1), static_cast<Word16>(p.sign))
+                     : static_cast<Word16>(p.index);
+}
+
 }  // namespace vamrnb::enc_kernel

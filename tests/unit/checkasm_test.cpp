@@ -13,6 +13,7 @@
 #include "enc/subframe.h"
 #include "lpc/dsp.h"
 #include "lpc/lpc.h"
+#include "lpc/tables.h"
 #include "vamrnb.h"
 
 using namespace vamrnb;
@@ -216,6 +217,56 @@ TEST(Checkasm, EncoderCorrelations) {
             int16_t out[40];
             v.k->convolve(x, h, out);
             ASSERT_EQ(0, std::memcmp(out, ref, sizeof out)) << v.name << " t=" << t;
+        }
+    }
+    vamrnb_set_cpu_flags(before);
+}
+
+// Split-VQ searches: real codebooks and small-valued ones full of ties
+// (equal distances in different lanes, a row and its negation), plus rails
+// where every distance saturates.
+TEST(Checkasm, VqSearches) {
+    const auto vs = versions();
+    if (vs.empty()) GTEST_SKIP() << "no vector versions on this processor";
+    const uint32_t before = vamrnb_set_cpu_flags(0);
+    Gen g(107);
+    std::vector<int16_t> small(512 * 4);
+    for (int t = 0; t < 1500; ++t) {
+        const int kind = t % 4;
+        const int sizes[] = {64, 128, 256, 512};
+        const int size = kind == 3 ? 4 + 4 * (t % 7) : sizes[t % 4];
+        const int16_t *dico = kind == 0 ? vamrnb_tbl_dico2_lsf : small.data();
+        if (kind != 0) {
+            for (auto &v : small) v = static_cast<int16_t>(static_cast<int>(g.rng() % 5) - 2);
+            if (kind == 2) {
+                for (auto &v : small) v = g.sample(1);
+            }
+        }
+        int16_t r[4], w[4];
+        for (int k = 0; k < 4; ++k) {
+            r[k] = kind == 2 ? g.sample(1) : static_cast<int16_t>(static_cast<int>(g.rng() % 7) - 3);
+            w[k] = kind == 2 ? g.sample(t / 4) : static_cast<int16_t>(g.rng() % 9000);
+        }
+        if (kind == 0)
+            for (int k = 0; k < 4; ++k) r[k] = static_cast<int16_t>(static_cast<int>(g.rng() % 4001) - 2000);
+        const int n = kind == 0 ? 256 : size;
+        for (int fn = 0; fn < 3; ++fn) {
+            int16_t rr[4], rv[4];
+            std::memcpy(rr, r, sizeof r);
+            int16_t want;
+            if (fn == 0) want = vamrnbe_vq_subvec(rr, rr + 2, dico, w, w + 2, n);
+            else if (fn == 1) want = vamrnbe_vq_subvec_s(rr, rr + 2, dico, w, w + 2, n);
+            else want = vamrnbe_vq_subvec4(rr, dico, w, n);
+            for (const auto &v : vs) {
+                if (!v.k->vq_subvec) continue;
+                std::memcpy(rv, r, sizeof r);
+                int16_t got;
+                if (fn == 0) got = v.k->vq_subvec(rv, rv + 2, dico, w, w + 2, n);
+                else if (fn == 1) got = v.k->vq_subvec_s(rv, rv + 2, dico, w, w + 2, n);
+                else got = v.k->vq_subvec4(rv, dico, w, n);
+                ASSERT_EQ(got, want) << v.name << " fn=" << fn << " t=" << t;
+                ASSERT_EQ(0, std::memcmp(rv, rr, sizeof rr)) << v.name << " fn=" << fn << " t=" << t;
+            }
         }
     }
     vamrnb_set_cpu_flags(before);

@@ -202,6 +202,79 @@ void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+namespace {
+
+// Row sums of four squares for two rows held in one register.
+inline uint32x2_t row_sums(int16x8_t t) {
+    const uint32x4_t lo = vreinterpretq_u32_s32(vmull_s16(vget_low_s16(t), vget_low_s16(t)));
+    const uint32x4_t hi = vreinterpretq_u32_s32(vmull_s16(vget_high_s16(t), vget_high_s16(t)));
+    return vpadd_u32(vpadd_u32(vget_low_u32(lo), vget_high_u32(lo)),
+                     vpadd_u32(vget_low_u32(hi), vget_high_u32(hi)));
+}
+
+// Distances of four rows (two per register), saturated like the running sum;
+// vqdmulh is exactly mult().
+template <bool Negated>
+inline uint32x4_t vq_dist4(int16x8_t rv, int16x8_t wv, int16x8_t a, int16x8_t b) {
+    const int16x8_t da = Negated ? vqaddq_s16(rv, a) : vqsubq_s16(rv, a);
+    const int16x8_t db = Negated ? vqaddq_s16(rv, b) : vqsubq_s16(rv, b);
+    const uint32x4_t sum = vcombine_u32(row_sums(vqdmulhq_s16(wv, da)), row_sums(vqdmulhq_s16(wv, db)));
+    const uint32x4_t big = vcgeq_u32(sum, vdupq_n_u32(0x40000000u));
+    return vbslq_u32(big, vdupq_n_u32(0x7fffffffu), vshlq_n_u32(sum, 1));
+}
+
+template <bool Signed>
+enc_kernel::VqPick vq_search(const Word16 r[4], const Word16 w[4], const Word16 *dico, int size) {
+    const Word16 r8[8] = {r[0], r[1], r[2], r[3], r[0], r[1], r[2], r[3]};
+    const Word16 w8[8] = {w[0], w[1], w[2], w[3], w[0], w[1], w[2], w[3]};
+    const int16x8_t rv = vld1q_s16(r8), wv = vld1q_s16(w8);
+    const int32_t start[4] = {0, 1, 2, 3};
+    uint32x4_t best = vdupq_n_u32(0x7fffffffu);
+    int32x4_t bidx = vdupq_n_s32(-1), bsign = vdupq_n_s32(0), cur = vld1q_s32(start);
+    const int n4 = size & ~3;
+    for (int i = 0; i < n4; i += 4) {
+        const int16x8_t a = vld1q_s16(dico + 4 * i), b = vld1q_s16(dico + 4 * i + 8);
+        const uint32x4_t d = vq_dist4<false>(rv, wv, a, b);
+        uint32x4_t m = vcltq_u32(d, best);
+        best = vbslq_u32(m, d, best);
+        bidx = vbslq_s32(m, cur, bidx);
+        bsign = vbslq_s32(m, vdupq_n_s32(0), bsign);
+        if (Signed) {
+            const uint32x4_t dn = vq_dist4<true>(rv, wv, a, b);
+            m = vcltq_u32(dn, best);
+            best = vbslq_u32(m, dn, best);
+            bidx = vbslq_s32(m, cur, bidx);
+            bsign = vbslq_s32(m, vdupq_n_s32(1), bsign);
+        }
+        cur = vaddq_s32(cur, vdupq_n_s32(4));
+    }
+    Word32 dist[4];
+    int32_t index[4], sign[4];
+    vst1q_s32(dist, vreinterpretq_s32_u32(best));
+    vst1q_s32(index, bidx);
+    vst1q_s32(sign, bsign);
+    return enc_kernel::vq_tail(r, w, dico, n4, size, Signed, enc_kernel::vq_join(dist, index, sign));
+}
+
+}  // namespace
+
+int16_t vq_subvec_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1, const Word16 *w2,
+                       Word32 size) {
+    const Word16 r[4] = {r1[0], r1[1], r2[0], r2[1]}, w[4] = {w1[0], w1[1], w2[0], w2[1]};
+    return enc_kernel::vq_finish(r1, r2, dico, vq_search<false>(r, w, dico, size), false);
+}
+
+int16_t vq_subvec_s_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                         const Word16 *w2, Word32 size) {
+    const Word16 r[4] = {r1[0], r1[1], r2[0], r2[1]}, w[4] = {w1[0], w1[1], w2[0], w2[1]};
+    return enc_kernel::vq_finish(r1, r2, dico, vq_search<true>(r, w, dico, size), true);
+}
+
+int16_t vq_subvec4_neon(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size) {
+    const Word16 rv[4] = {r[0], r[1], r[2], r[3]};
+    return enc_kernel::vq_finish(r, r + 2, dico, vq_search<false>(rv, w, dico, size), false);
+}
+
 }  // namespace vamrnb
 
 #endif  // VAMRNB_DSP_NEON

@@ -261,6 +261,80 @@ VAMRNB_SSE41 void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+namespace {
+
+// mult(w, d) on eight lanes: the high 17 bits of the 32-bit product; the
+// one product that leaves 16 bits (-32768·-32768) saturates to 32767.
+VAMRNB_SSE41 inline __m128i mult16(__m128i w, __m128i d) {
+    const __m128i t = _mm_or_si128(_mm_slli_epi16(_mm_mulhi_epi16(w, d), 1),
+                                   _mm_srli_epi16(_mm_mullo_epi16(w, d), 15));
+    return _mm_xor_si128(t, _mm_cmpeq_epi16(t, _mm_set1_epi16(static_cast<int16_t>(0x8000))));
+}
+
+// Distances of four rows (two per register), saturated like the running sum.
+template <bool Negated>
+VAMRNB_SSE41 inline __m128i vq_dist4(__m128i rv, __m128i wv, __m128i a, __m128i b) {
+    const __m128i da = Negated ? _mm_adds_epi16(rv, a) : _mm_subs_epi16(rv, a);
+    const __m128i db = Negated ? _mm_adds_epi16(rv, b) : _mm_subs_epi16(rv, b);
+    const __m128i ta = mult16(wv, da), tb = mult16(wv, db);
+    // Per row the sum of four squares, below 2^32 as an unsigned value.
+    const __m128i sum = _mm_hadd_epi32(_mm_madd_epi16(ta, ta), _mm_madd_epi16(tb, tb));
+    const __m128i big = _mm_cmpgt_epi32(_mm_srli_epi32(sum, 30), _mm_setzero_si128());
+    return _mm_blendv_epi8(_mm_slli_epi32(sum, 1), _mm_set1_epi32(0x7fffffff), big);
+}
+
+template <bool Signed>
+VAMRNB_SSE41 enc_kernel::VqPick vq_search(const Word16 r[4], const Word16 w[4], const Word16 *dico,
+                                          int size) {
+    const __m128i rv = _mm_setr_epi16(r[0], r[1], r[2], r[3], r[0], r[1], r[2], r[3]);
+    const __m128i wv = _mm_setr_epi16(w[0], w[1], w[2], w[3], w[0], w[1], w[2], w[3]);
+    __m128i best = _mm_set1_epi32(0x7fffffff), bidx = _mm_set1_epi32(-1), bsign = _mm_setzero_si128();
+    __m128i cur = _mm_setr_epi32(0, 1, 2, 3);
+    const int n4 = size & ~3;
+    for (int i = 0; i < n4; i += 4) {
+        const __m128i a = _mm_loadu_si128(reinterpret_cast<const __m128i *>(dico + 4 * i));
+        const __m128i b = _mm_loadu_si128(reinterpret_cast<const __m128i *>(dico + 4 * i + 8));
+        const __m128i d = vq_dist4<false>(rv, wv, a, b);
+        __m128i m = _mm_cmplt_epi32(d, best);
+        best = _mm_blendv_epi8(best, d, m);
+        bidx = _mm_blendv_epi8(bidx, cur, m);
+        bsign = _mm_andnot_si128(m, bsign);
+        if (Signed) {
+            const __m128i dn = vq_dist4<true>(rv, wv, a, b);
+            m = _mm_cmplt_epi32(dn, best);
+            best = _mm_blendv_epi8(best, dn, m);
+            bidx = _mm_blendv_epi8(bidx, cur, m);
+            bsign = _mm_blendv_epi8(bsign, _mm_set1_epi32(1), m);
+        }
+        cur = _mm_add_epi32(cur, _mm_set1_epi32(4));
+    }
+    alignas(16) Word32 dist[4];
+    alignas(16) int32_t index[4], sign[4];
+    _mm_store_si128(reinterpret_cast<__m128i *>(dist), best);
+    _mm_store_si128(reinterpret_cast<__m128i *>(index), bidx);
+    _mm_store_si128(reinterpret_cast<__m128i *>(sign), bsign);
+    return enc_kernel::vq_tail(r, w, dico, n4, size, Signed, enc_kernel::vq_join(dist, index, sign));
+}
+
+}  // namespace
+
+VAMRNB_SSE41 int16_t vq_subvec_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                                     const Word16 *w2, Word32 size) {
+    const Word16 r[4] = {r1[0], r1[1], r2[0], r2[1]}, w[4] = {w1[0], w1[1], w2[0], w2[1]};
+    return enc_kernel::vq_finish(r1, r2, dico, vq_search<false>(r, w, dico, size), false);
+}
+
+VAMRNB_SSE41 int16_t vq_subvec_s_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                                       const Word16 *w2, Word32 size) {
+    const Word16 r[4] = {r1[0], r1[1], r2[0], r2[1]}, w[4] = {w1[0], w1[1], w2[0], w2[1]};
+    return enc_kernel::vq_finish(r1, r2, dico, vq_search<true>(r, w, dico, size), true);
+}
+
+VAMRNB_SSE41 int16_t vq_subvec4_sse41(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size) {
+    const Word16 rv[4] = {r[0], r[1], r[2], r[3]};
+    return enc_kernel::vq_finish(r, r + 2, dico, vq_search<false>(rv, w, dico, size), false);
+}
+
 }  // namespace vamrnb
 
 #endif  // VAMRNB_DSP_X86
