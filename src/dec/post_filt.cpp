@@ -8,6 +8,7 @@
 
 #include "basic_op/ext_op.h"
 #include "lpc/lpc.h"
+#include "lpc/syn_core.h"
 #include "lpc/tables.h"
 
 using namespace vamrnb;
@@ -17,6 +18,19 @@ namespace {
 constexpr Word16 MU = 26214;       // tilt compensation factor, 0.8
 constexpr Word16 AGC_FAC = 29491;  // gain control smoothing, 0.9
 constexpr int L_H = 22;            // truncated impulse response length
+
+// First L_H samples of the impulse response of num(z) / den(z), with the
+// synthesis filter's arithmetic (plain 32-bit sums, its range rule).
+void impulse_response(const Word16 *num, const Word16 *den, Word16 *h) {
+    Word16 buf[M + L_H] = {};  // zero memory ahead of the response
+    Word16 *y = buf + M;
+    for (int n = 0; n < L_H; ++n) {
+        Word32 s = n <= M ? wrap_mul(den[0], num[n]) : 0;
+        for (int i = 1; i <= M; ++i) s = wrap_sub(s, wrap_mul(den[i], y[n - i]));
+        y[n] = syn::Plain::out(s, nullptr);
+    }
+    std::memcpy(h, y, L_H * sizeof(Word16));
+}
 
 // Scales the post-filtered subframe so that its energy follows the input's,
 // with a smoothed gain.
@@ -113,10 +127,8 @@ extern "C" void vamrnbd_post_filt(dec_state *st, dec_work *w, int32_t mode) {
         vamrnb_residu(Ap_num, syn + i_subfr, pf->res2);
 
         // impulse response of the weighted filter pair, for the tilt
-        Word16 h[L_SUBFR] = {};
-        static constexpr Word16 zero_mem[M] = {};
-        std::memcpy(h, Ap_num, sizeof Ap_num);
-        vamrnb_syn_filt(Ap_den, h, zero_mem, h);
+        Word16 h[L_H];
+        impulse_response(Ap_num, Ap_den, h);
         Word32 L = l_mult(h[0], h[0]);
         for (int i = 1; i < L_H; ++i) L = l_mac(L, h[i], h[i]);
         const Word16 r0 = extract_h(L);
