@@ -12,6 +12,7 @@
 #include "enc/subframe.h"
 
 #include "basic_op/ext_op.h"
+#include "lpc/dsp.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
@@ -314,6 +315,11 @@ using namespace vamrnb;
 extern "C" {
 
 void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y) {
+    // A vector version with identical results takes over where available.
+    if (const ConvolveFn vec = dsp().convolve) {
+        vec(x, h, y);
+        return;
+    }
     for (int n = 0; n < L_SUBFR; ++n) {
         Word32 s = 0;
         for (int i = 0; i <= n; ++i) s = l_mac(s, x[i], h[n - i]);
