@@ -115,147 +115,119 @@ TEST(LspAz, MatchesDoublePrecisionExpansion) {
     }
 }
 
+// Sets built from the same LSPs are identical; the interpolated sets are the
+// conversions of the shifted sums.
 TEST(IntLpc, SubframeSets) {
     std::mt19937 rng(3);
-    Word16 f_old[10], f_mid[10], f_new[10], old_[10], mid[10], nw[10];
-    random_lsf(rng, f_old);
-    random_lsf(rng, f_mid);
-    random_lsf(rng, f_new);
-    vamrnb_sf_sp(f_old, vamrnb_tbl_cos_lsp_lsf, old_);
-    vamrnb_sf_sp(f_mid, vamrnb_tbl_cos_lsp_lsf, mid);
-    vamrnb_sf_sp(f_new, vamrnb_tbl_cos_lsp_lsf, nw);
+    Word16 f[3][10], lsp[3][10];
+    for (int k = 0; k < 3; ++k) {
+        random_lsf(rng, f[k]);
+        vamrnb_sf_sp(f[k], vamrnb_tbl_cos_lsp_lsf, lsp[k]);
+    }
+    const Word16 *old_ = lsp[0], *mid = lsp[1], *nw = lsp[2];
+    auto az_of = [](const Word16 *x, const Word16 *y, int sx, int sy, Word16 out[11]) {
+        Word16 v[10];   // x - (x >> sx) + (y >> sy), or x >> 1 + y >> 1 when sx = 1
+        for (int i = 0; i < 10; ++i)
+            v[i] = static_cast<Word16>(sx == 1 ? (x[i] >> 1) + (y[i] >> 1) : x[i] - (x[i] >> sx) + (y[i] >> sy));
+        vamrnb_lsp_az(v, out);
+    };
+    Word16 az[44], want[4][11];
 
-    Word16 az[44], one[11];
     // Unchanged LSPs: the 3/4-1/4 sets are exact; the halves lose the odd LSB.
     vamrnb_int_lpc_1to3(nw, nw, az);
-    vamrnb_lsp_az(nw, one);
-    for (int k : {0, 2, 3}) EXPECT_EQ(0, std::memcmp(az + 11 * k, one, sizeof one)) << k;
-    Word16 even[10], even_a[11];
-    for (int i = 0; i < 10; ++i) even[i] = static_cast<Word16>((nw[i] >> 1) * 2);
-    vamrnb_lsp_az(even, even_a);
-    EXPECT_EQ(0, std::memcmp(az + 11, even_a, sizeof even_a));
+    vamrnb_lsp_az(nw, want[0]);
+    for (int k : {0, 2, 3}) EXPECT_EQ(0, std::memcmp(az + 11 * k, want[0], 22)) << k;
 
-    // Changing LSPs: subframe 4 is the new set, 2 the midpoint, and 1 and 3
-    // lie between their neighbours.
     vamrnb_int_lpc_1to3(old_, nw, az);
-    EXPECT_EQ(0, std::memcmp(az + 33, one, sizeof one));
-    Word16 half[10], want[11];
-    for (int i = 0; i < 10; ++i) half[i] = static_cast<Word16>((old_[i] >> 1) + (nw[i] >> 1));
-    vamrnb_lsp_az(half, want);
-    EXPECT_EQ(0, std::memcmp(az + 11, want, sizeof want));
+    az_of(old_, nw, 2, 2, want[0]);
+    az_of(old_, nw, 1, 1, want[1]);
+    az_of(nw, old_, 2, 2, want[2]);
+    vamrnb_lsp_az(nw, want[3]);
+    EXPECT_EQ(0, std::memcmp(az, want, sizeof az));
 
     vamrnb_int_lpc_1and3(old_, mid, nw, az);
-    vamrnb_lsp_az(mid, want);
-    EXPECT_EQ(0, std::memcmp(az + 11, want, sizeof want));
-    EXPECT_EQ(0, std::memcmp(az + 33, one, sizeof one));
-    for (int i = 0; i < 10; ++i) half[i] = static_cast<Word16>((mid[i] >> 1) + (nw[i] >> 1));
-    vamrnb_lsp_az(half, want);
-    EXPECT_EQ(0, std::memcmp(az + 22, want, sizeof want));
-    for (int i = 0; i < 10; ++i) half[i] = static_cast<Word16>((mid[i] >> 1) + (old_[i] >> 1));
-    vamrnb_lsp_az(half, want);
-    EXPECT_EQ(0, std::memcmp(az, want, sizeof want));
+    az_of(mid, old_, 1, 1, want[0]);
+    vamrnb_lsp_az(mid, want[1]);
+    az_of(mid, nw, 1, 1, want[2]);
+    EXPECT_EQ(0, std::memcmp(az, want, sizeof az));
 }
 
 // ---- decoder dequantisers ---------------------------------------------------
 
 TEST(DPlsf3, CodebookChoiceByMode) {
-    const Word16 idx[3] = {5, 255, 100};
     Word16 past_lsf[10], past_r[10] = {}, lsp[10];
     std::memcpy(past_lsf, vamrnb_tbl_mean_lsf, sizeof past_lsf);
-
-    // MR475: second index doubled (row 510), third codebook the 128-row one.
-    vamrnbd_d_plsf_3(0, 0, idx, past_lsf, past_r, lsp);
-    for (int i = 0; i < 3; ++i) EXPECT_EQ(past_r[i], tab::q_plsf_3_dico1_lsf[5 * 3 + i]);
-    for (int i = 0; i < 3; ++i) EXPECT_EQ(past_r[3 + i], tab::q_plsf_3_dico2_lsf[510 * 3 + i]);
-    for (int i = 0; i < 4; ++i) EXPECT_EQ(past_r[6 + i], tab::mr515_3_lsf[100 * 4 + i]);
-
-    // MR795: its own first codebook, full second and third codebooks.
-    const Word16 idx795[3] = {400, 255, 500};
-    vamrnbd_d_plsf_3(5, 0, idx795, past_lsf, past_r, lsp);
-    for (int i = 0; i < 3; ++i) EXPECT_EQ(past_r[i], tab::mr795_1_lsf[400 * 3 + i]);
-    for (int i = 0; i < 3; ++i) EXPECT_EQ(past_r[3 + i], tab::q_plsf_3_dico2_lsf[255 * 3 + i]);
-    for (int i = 0; i < 4; ++i) EXPECT_EQ(past_r[6 + i], tab::q_plsf_3_dico3_lsf[500 * 4 + i]);
+    struct Case { int mode; Word16 idx[3]; const Word16 *cb1; int row2; const Word16 *cb3; };
+    const Case cases[] = {
+        {0, {5, 255, 100}, tab::q_plsf_3_dico1_lsf, 510, tab::mr515_3_lsf},      // index 2 doubled
+        {5, {400, 255, 500}, tab::mr795_1_lsf, 255, tab::q_plsf_3_dico3_lsf},
+        {6, {200, 511, 511}, tab::q_plsf_3_dico1_lsf, 511, tab::q_plsf_3_dico3_lsf},
+    };
+    for (const auto &c : cases) {
+        vamrnbd_d_plsf_3(c.mode, 0, c.idx, past_lsf, past_r, lsp);
+        EXPECT_EQ(0, std::memcmp(past_r, c.cb1 + 3 * c.idx[0], 6)) << c.mode;
+        EXPECT_EQ(0, std::memcmp(past_r + 3, tab::q_plsf_3_dico2_lsf + 3 * c.row2, 6)) << c.mode;
+        EXPECT_EQ(0, std::memcmp(past_r + 6, c.cb3 + 4 * c.idx[2], 8)) << c.mode;
+    }
 }
 
 TEST(DPlsf3, DtxWithoutHistoryIsMeanPlusResidual) {
     const Word16 idx[3] = {17, 300, 42};
-    Word16 past_lsf[10] = {}, past_r[10] = {}, lsp[10];
+    Word16 past_lsf[10] = {}, past_r[10] = {}, lsp[10], want[10], want_lsp[10];
     vamrnbd_d_plsf_3(8, 0, idx, past_lsf, past_r, lsp);
-    Word16 want[10];
-    for (int i = 0; i < 3; ++i) want[i] = tab::q_plsf_3_dico1_lsf[17 * 3 + i];
-    for (int i = 0; i < 3; ++i) want[3 + i] = tab::q_plsf_3_dico2_lsf[300 * 3 + i];
-    for (int i = 0; i < 4; ++i) want[6 + i] = tab::q_plsf_3_dico3_lsf[42 * 4 + i];
-    for (int i = 0; i < 10; ++i) want[i] = static_cast<Word16>(want[i] + tab::q_plsf_3_mean_lsf[i]);
+    for (int i = 0; i < 10; ++i) {
+        const Word16 r = i < 3 ? tab::q_plsf_3_dico1_lsf[17 * 3 + i]
+                       : i < 6 ? tab::q_plsf_3_dico2_lsf[300 * 3 + i - 3]
+                               : tab::q_plsf_3_dico3_lsf[42 * 4 + i - 6];
+        want[i] = static_cast<Word16>(r + tab::q_plsf_3_mean_lsf[i]);
+    }
     vamrnb_reorder(want);
-    EXPECT_EQ(0, std::memcmp(past_lsf, want, sizeof want));
-    Word16 want_lsp[10];
     vamrnb_sf_sp(want, vamrnb_tbl_cos_lsp_lsf, want_lsp);
+    EXPECT_EQ(0, std::memcmp(past_lsf, want, sizeof want));
     EXPECT_EQ(0, std::memcmp(lsp, want_lsp, sizeof lsp));
 }
 
-// Bad frames pull the LSFs geometrically to the mean, and the residual memory
-// follows so that a good frame right after predicts from the concealed LSFs.
+namespace {
+
+double deviation(const Word16 *a, const Word16 *b) {
+    double d = 0;
+    for (int i = 0; i < 10; ++i) d += std::abs(a[i] - b[i]);
+    return d;
+}
+
+}  // namespace
+
+// Bad frames pull the LSFs geometrically to the mean (0.9 per frame for the
+// three-split quantiser, 0.95 for the five-split one) until the truncating
+// products stall them a few LSB short.
 TEST(DPlsf, BadFramesConvergeToTheMean) {
-    const Word16 idx3[3] = {200, 10, 300};
-    Word16 past_lsf[10], past_r[10] = {}, lsp[10];
-    std::memcpy(past_lsf, vamrnb_tbl_mean_lsf, sizeof past_lsf);
-    for (int f = 0; f < 3; ++f) vamrnbd_d_plsf_3(2, 0, idx3, past_lsf, past_r, lsp);
-
-    const Word16 *mean3 = tab::q_plsf_3_mean_lsf;
-    double prev_dev = 0;
-    for (int i = 0; i < 10; ++i) prev_dev += std::abs(past_lsf[i] - mean3[i]);
-    ASSERT_GT(prev_dev, 500);
-    for (int f = 0; f < 80; ++f) {
-        Word16 before[10];
-        std::memcpy(before, past_lsf, sizeof before);
-        vamrnbd_d_plsf_3(2, 1, idx3, past_lsf, past_r, lsp);
-        double dev = 0;
-        for (int i = 0; i < 10; ++i) dev += std::abs(past_lsf[i] - mean3[i]);
-        if (f < 10) {
-            EXPECT_NEAR(dev, 0.9 * prev_dev, 0.02 * prev_dev + 20) << f;
+    Word16 past_lsf[10], past_r[10] = {}, lsp[10], lsp2[10];
+    const Word16 idx3[3] = {200, 10, 300}, idx5[5] = {100, 200, 301, 50, 60};
+    for (int q = 0; q < 2; ++q) {
+        const Word16 *mean = q == 0 ? tab::q_plsf_3_mean_lsf : vamrnb_tbl_mean_lsf;
+        const double factor = q == 0 ? 0.9 : 0.95;
+        auto frame = [&](int bfi) {
+            if (q == 0) vamrnbd_d_plsf_3(2, bfi, idx3, past_lsf, past_r, lsp);
+            else d_plsf_5(static_cast<Word16>(bfi), idx5, past_lsf, past_r, lsp, lsp2);
+        };
+        std::memcpy(past_lsf, vamrnb_tbl_mean_lsf, sizeof past_lsf);
+        std::memset(past_r, 0, sizeof past_r);
+        for (int f = 0; f < 3; ++f) frame(0);
+        double prev = deviation(past_lsf, mean);
+        ASSERT_GT(prev, 300);
+        for (int f = 0; f < 200; ++f) {
+            frame(1);
+            const double dev = deviation(past_lsf, mean);
+            if (f < 10) {
+                EXPECT_NEAR(dev, factor * prev, 0.02 * prev + 20) << q << " " << f;
+            }
+            prev = dev;
         }
-        prev_dev = dev;
-    }
-    for (int i = 0; i < 10; ++i) EXPECT_NEAR(past_lsf[i], mean3[i], 25) << i;
-
-    // The memory was back-computed: a good frame whose residual equals the
-    // memory-driven prediction error reproduces continuity (residual row 0 of
-    // each codebook added to the predicted LSFs).
-    Word16 pr[10];
-    std::memcpy(pr, past_r, sizeof pr);
-    const Word16 idx0[3] = {0, 0, 0};
-    vamrnbd_d_plsf_3(2, 0, idx0, past_lsf, past_r, lsp);
-    Word16 r0[10];
-    for (int i = 0; i < 3; ++i) r0[i] = tab::q_plsf_3_dico1_lsf[i];
-    for (int i = 0; i < 3; ++i) r0[3 + i] = tab::q_plsf_3_dico2_lsf[i];
-    for (int i = 0; i < 4; ++i) r0[6 + i] = tab::q_plsf_3_dico3_lsf[i];
-    Word16 want[10];
-    for (int i = 0; i < 10; ++i)
-        want[i] = static_cast<Word16>(r0[i] + mean3[i] + ((pr[i] * tab::pred_fac[i]) >> 15));
-    vamrnb_reorder(want);
-    EXPECT_EQ(0, std::memcmp(past_lsf, want, sizeof want));
-
-    // Five-split: factor 0.95 towards its own mean.
-    const Word16 idx5[5] = {100, 200, 301, 50, 60};
-    Word16 lsp1[10], lsp2[10];
-    std::memset(past_r, 0, sizeof past_r);
-    std::memcpy(past_lsf, vamrnb_tbl_mean_lsf, sizeof past_lsf);
-    for (int f = 0; f < 3; ++f) d_plsf_5(0, idx5, past_lsf, past_r, lsp1, lsp2);
-    const Word16 *mean5 = vamrnb_tbl_mean_lsf;
-    prev_dev = 0;
-    for (int i = 0; i < 10; ++i) prev_dev += std::abs(past_lsf[i] - mean5[i]);
-    ASSERT_GT(prev_dev, 300);
-    for (int f = 0; f < 200; ++f) {
-        d_plsf_5(1, idx5, past_lsf, past_r, lsp1, lsp2);
-        EXPECT_EQ(0, std::memcmp(lsp1, lsp2, sizeof lsp1));
-        double dev = 0;
-        for (int i = 0; i < 10; ++i) dev += std::abs(past_lsf[i] - mean5[i]);
-        if (f < 10) {
-            EXPECT_NEAR(dev, 0.95 * prev_dev, 0.02 * prev_dev + 20) << f;
+        for (int i = 0; i < 10; ++i) EXPECT_NEAR(past_lsf[i], mean[i], q == 0 ? 25 : 60) << q << " " << i;
+        if (q == 1) {
+            EXPECT_EQ(0, std::memcmp(lsp, lsp2, sizeof lsp));   // both sets concealed alike
         }
-        prev_dev = dev;
     }
-    for (int i = 0; i < 10; ++i) EXPECT_NEAR(past_lsf[i], mean5[i], 60) << i;
 }
 
 TEST(DPlsf5, RowsSignAndTwoSets) {
@@ -263,32 +235,23 @@ TEST(DPlsf5, RowsSignAndTwoSets) {
     std::memcpy(past_lsf, vamrnb_tbl_mean_lsf, sizeof past_lsf);
     const Word16 idx[5] = {3, 4, 1, 6, 7};   // split 3: row 0, negated
     d_plsf_5(0, idx, past_lsf, past_r, lsp1, lsp2);
-    EXPECT_EQ(past_r[0], vamrnb_tbl_dico1_lsf[3 * 4 + 2]);
-    EXPECT_EQ(past_r[1], vamrnb_tbl_dico1_lsf[3 * 4 + 3]);
-    EXPECT_EQ(past_r[2], vamrnb_tbl_dico2_lsf[4 * 4 + 2]);
-    EXPECT_EQ(past_r[4], -vamrnb_tbl_dico3_lsf[2]);
-    EXPECT_EQ(past_r[5], -vamrnb_tbl_dico3_lsf[3]);
-    EXPECT_EQ(past_r[7], vamrnb_tbl_dico4_lsf[6 * 4 + 3]);
-    EXPECT_EQ(past_r[9], vamrnb_tbl_dico5_lsf[7 * 4 + 3]);
-
-    // With zero memory: set 1 = mean + first-set residuals, set 2 likewise.
-    Word16 f1[10], f2[10];
-    const Word16 *rows[5] = {&vamrnb_tbl_dico1_lsf[12], &vamrnb_tbl_dico2_lsf[16],
-                             &vamrnb_tbl_dico3_lsf[0], &vamrnb_tbl_dico4_lsf[24],
-                             &vamrnb_tbl_dico5_lsf[28]};
+    const Word16 *rows[5] = {&vamrnb_tbl_dico1_lsf[12], &vamrnb_tbl_dico2_lsf[16], &vamrnb_tbl_dico3_lsf[0],
+                             &vamrnb_tbl_dico4_lsf[24], &vamrnb_tbl_dico5_lsf[28]};
+    // With zero memory each set is the mean plus its half of the row.
+    Word16 f1[10], f2[10], w1[10], w2[10];
     for (int k = 0; k < 5; ++k) {
         const int s = k == 2 ? -1 : 1;
         for (int j = 0; j < 2; ++j) {
+            EXPECT_EQ(past_r[2 * k + j], s * rows[k][2 + j]);
             f1[2 * k + j] = static_cast<Word16>(vamrnb_tbl_mean_lsf[2 * k + j] + s * rows[k][j]);
             f2[2 * k + j] = static_cast<Word16>(vamrnb_tbl_mean_lsf[2 * k + j] + s * rows[k][2 + j]);
         }
     }
     vamrnb_reorder(f1);
     vamrnb_reorder(f2);
-    EXPECT_EQ(0, std::memcmp(past_lsf, f2, sizeof f2));
-    Word16 w1[10], w2[10];
     vamrnb_sf_sp(f1, vamrnb_tbl_cos_lsp_lsf, w1);
     vamrnb_sf_sp(f2, vamrnb_tbl_cos_lsp_lsf, w2);
+    EXPECT_EQ(0, std::memcmp(past_lsf, f2, sizeof f2));
     EXPECT_EQ(0, std::memcmp(lsp1, w1, sizeof w1));
     EXPECT_EQ(0, std::memcmp(lsp2, w2, sizeof w2));
 }
