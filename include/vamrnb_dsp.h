@@ -2,9 +2,10 @@
  * vamrnb — building blocks exported for other codec components.
  *
  * The fixed-point operators and extended functions, the library lifecycle
- * and aligned-memory services, the bit-stream reader and writer, the frame
- * tables and the frame packing/unpacking functions.  Everything has C
- * linkage; the header compiles as C11 and as C++17 on its own.
+ * and aligned-memory services, the bit-stream reader and writer, and the
+ * frame packing/unpacking functions; the exported constant tables come with
+ * vamrnb_tables.h, included here.  Everything has C linkage; the header
+ * compiles as C11 and as C++17 on its own.
  *
  * Fixed-point values travel as plain integers: a Word16 argument is passed
  * in an int32_t (or int16_t) and only its low 16 bits count, sign-extended;
@@ -18,6 +19,7 @@
 #include <stdint.h>
 
 #include "vamrnb.h"
+#include "vamrnb_tables.h" /* the exported constant tables */
 
 #ifdef __cplusplus
 extern "C" {
@@ -130,18 +132,6 @@ VAMRNB_API void     vcmn_bsw_init(vcmn_bsw *bs, uint8_t *buf, uint32_t size,
                                   vcmn_bsw_byte_fn on_byte);
 VAMRNB_API uint32_t vcmn_bsw_write1(vcmn_bsw *bs, uint32_t bit);
 VAMRNB_API uint32_t vcmn_bsw_write(vcmn_bsw *bs, uint32_t value, int32_t n);
-
-/* ---- frame tables -------------------------------------------------------- */
-VAMRNB_API extern const uint8_t vamrnb_tbl_toc_byte[16];
-VAMRNB_API extern const int16_t vamrnb_tbl_unpacked_size[16];
-VAMRNB_API extern const int16_t vamrnb_tbl_packed_size[16];
-VAMRNB_API extern const int16_t vamrnb_tbl_unused_size[16];
-VAMRNB_API extern const int16_t vamrnb_tbl_packed_size_IF2[16];
-VAMRNB_API extern const int16_t vamrnb_tbl_unused_size_IF2[16];
-VAMRNB_API extern const int16_t vamrnb_tbl_prmno[10];
-VAMRNB_API extern const int16_t vamrnb_tbl_prmnofsf[9];
-VAMRNB_API extern const int16_t *const vamrnb_tbl_bitno[10];
-VAMRNB_API extern const int16_t *const vamrnb_tbl_sort_ptr[16];
 
 /* ---- frame unpacking, homing tests and packing --------------------------- */
 /* Classification of a received frame (Q bit, frame mode, reception type). */

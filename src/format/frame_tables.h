@@ -5,7 +5,7 @@
 
 #include <cstdint>
 
-#include "vamrnb_dsp.h"
+#include "vamrnb_tables.h"
 
 extern "C" {
 extern const int16_t vamrnb_tbl_packed_size[16];

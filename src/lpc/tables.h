@@ -5,6 +5,8 @@
 
 #include <cstdint>
 
+#include "vamrnb_tables.h"
+
 extern "C" {
 extern const int16_t vamrnb_tbl_dtx_log_en_adjust[9];
 extern const int16_t vamrnbe_tbl_gamma1[10];
