@@ -46,9 +46,11 @@ VAMRNB_API void vamrnbe_bs_pack(vcmn_bsw *writer, const int16_t *bits, int32_t m
     for (int j = 0; j < nbits; ++j) vcmn_bsw_write1(writer, bits[order[j]] == 1 ? 1u : 0u);
 
     if (ft == FT_SID) {
-        // Type indicator (1: update), then the requested mode, least
-        // significant bit first.
-        vcmn_bsw_write1(writer, sid->tx_type == TX_SID_UPDATE ? 1u : 0u);
+        // Type indicator (1: update) from the SID scheduling state (the
+        // frame's TX type stands in when there is none), then the requested
+        // mode, least significant bit first.
+        const int32_t sid_type = sid ? sid->tx_type : tx_type;
+        vcmn_bsw_write1(writer, sid_type == TX_SID_UPDATE ? 1u : 0u);
         for (int b = 0; b < 3; ++b) vcmn_bsw_write1(writer, static_cast<uint32_t>(mode >> b) & 1u);
     }
 
