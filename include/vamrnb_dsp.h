@@ -149,6 +149,39 @@ VAMRNB_API void    vamrnbe_bs_pack(vcmn_bsw *writer, const int16_t *bits, int32_
                                    int32_t *used_mode, int32_t tx_type,
                                    const struct sid_sync_state *sid);
 
+/* ---- LSP/LPC conversion, gain prediction, subframe kernels -------------- */
+/* LSF <-> LSP (cosine table: vamrnb_tbl_cos_lsp_lsf), minimum LSF spacing,
+ * LSP -> order-10 LPC (returns 0), interpolation to four subframe sets. */
+VAMRNB_API void    vamrnb_sf_sp(const int16_t lsf[10], const int16_t *table, int16_t lsp[10]);
+VAMRNB_API void    vamrnb_lsp_lsf(const int16_t lsp[10], int16_t lsf[10]);
+VAMRNB_API void    vamrnb_reorder(int16_t lsf[10]);
+VAMRNB_API int32_t vamrnb_lsp_az(const int16_t lsp[10], int16_t a[11]);
+VAMRNB_API void    vamrnb_int_lpc_1to3(const int16_t lsp_old[10], const int16_t lsp_new[10], int16_t Az[44]);
+VAMRNB_API void    vamrnb_int_lpc_1and3(const int16_t lsp_old[10], const int16_t lsp_mid[10],
+                                        const int16_t lsp_new[10], int16_t Az[44]);
+/* Code-gain prediction from the two histories (newest first), its update,
+ * and the median of n <= 9 values. */
+VAMRNB_API void    vamrnb_gc_pred(const int16_t past_qua_en[4], const int16_t past_qua_en_MR122[4],
+                                  int32_t mode, const int16_t code[40],
+                                  int16_t *exp_gcode0, int16_t *frac_gcode0,
+                                  int16_t *exp_en, int16_t *frac_en);
+VAMRNB_API void    vamrnb_gc_pred_update(int16_t qua_ener_MR122, int16_t qua_ener,
+                                         int16_t past_qua_en[4], int16_t past_qua_en_MR122[4]);
+VAMRNB_API int16_t vamrnb_gmed_n(const int16_t *ind, int16_t n);
+/* Subframe kernels (40 samples, order 10). */
+VAMRNB_API void    vamrnb_syn_filt(const int16_t a[11], const int16_t x[40], const int16_t mem[10],
+                                   int16_t y[40]);
+VAMRNB_API void    vamrnbd_syn_filt_m(const int16_t a[11], const int16_t x[40], int32_t *overflow,
+                                      int16_t buf[50]);
+VAMRNB_API void    vamrnb_residu(const int16_t a[11], const int16_t *x, int16_t y[40]);
+VAMRNB_API void    vamrnb_weight_a(const int16_t *a, const int16_t *fac, int32_t m, int16_t *ap);
+VAMRNB_API void    vamrnb_pred_lt_3or6(int32_t T0, int32_t frac, int32_t flag3, int16_t *exc);
+VAMRNB_API int32_t vamrnb_energy(const int16_t *x, int32_t n, int32_t init);
+VAMRNB_API int32_t vamrnb_inner_product(const int16_t *x, const int16_t *y, int32_t n, int32_t init);
+/* Decoder three-split LSF dequantiser (mode 0..8, bfi nonzero: bad frame). */
+VAMRNB_API void    vamrnbd_d_plsf_3(int32_t mode, int32_t bfi, const int16_t *indices,
+                                    int16_t past_lsf_q[10], int16_t past_r_q[10], int16_t lsp_out[10]);
+
 #ifdef __cplusplus
 }
 #endif
