@@ -87,10 +87,12 @@ extern "C" int32_t vamrnbe_auto_corr(int16_t *y, int16_t r_h[11], int16_t r_l[11
     sum = l_add(sum, 1);   // keeps an all-zero window away from r[0] = 0
     const Word16 norm = norm_l(sum);
     l_extract(l_shl(sum, norm), &r_h[0], &r_l[0]);
+    // The energy did not clip, so no lag sum can (|r[k]| <= r[0]): plain
+    // products give the saturating sum exactly.
     for (int k = 1; k <= M; ++k) {
-        Word32 s = 0;
-        for (int j = 0; j < L_WINDOW - k; ++j) s = l_mac(s, y[j], y[j + k]);
-        l_extract(l_shl(s, norm), &r_h[k], &r_l[k]);
+        int32_t s = 0;
+        for (int j = 0; j < L_WINDOW - k; ++j) s += int32_t{y[j]} * y[j + k];
+        l_extract(l_shl(2 * s, norm), &r_h[k], &r_l[k]);
     }
     return sub(norm, scaled);
 }

@@ -268,6 +268,21 @@ Word16 ol_ltp(enc_state *st, int32_t mode, const Word16 *wsp, int len, int idx,
 
 extern "C" void vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max,
                                   int32_t lag_min, int32_t *corr) {
+    // Every partial sum of 2 x[j] x[j-lag] is bounded by the doubled energy of
+    // the whole span x[-lag_max .. len-1].  When that fits in 32 bits no
+    // step of the saturating sum can clip, and plain products give the same
+    // result (the scaled open-loop signal nearly always qualifies).
+    int64_t energy = 0;
+    for (int32_t j = -lag_max; j < len; ++j) energy += 2 * int64_t{x[j]} * x[j];
+    if (energy <= MAX_32) {
+        for (int32_t lag = lag_max; lag >= lag_min; --lag) {
+            const Word16 *d = x - lag;
+            int32_t t = 0;
+            for (int32_t j = 0; j < len; ++j) t += int32_t{x[j]} * d[j];
+            corr[-lag] = 2 * t;
+        }
+        return;
+    }
     for (int32_t lag = lag_max; lag >= lag_min; --lag) {
         const Word16 *d = x - lag;
         Word32 t = 0;

@@ -230,3 +230,15 @@ TEST(EncOlp, CorrelationOfPeriodicSignalPeaksAtPeriod) {
     EXPECT_TRUE(best == 57 || best == 114) << best;
     EXPECT_EQ(c[-57], c[-114]);
 }
+
+TEST(EncOlp, LoudSignalCorrelationSaturates) {
+    // Full-scale period-2 signal: even lags correlate fully, odd lags fully
+    // negatively; both sums run past 32 bits and must clip, not wrap.
+    std::vector<int16_t> buf(PIT_MAX + 80);
+    for (size_t i = 0; i < buf.size(); ++i) buf[i] = i % 2 ? int16_t(-32768) : int16_t(32767);
+    std::vector<int32_t> corr(PIT_MAX + 1);
+    vamrnbe_comp_corr(buf.data() + PIT_MAX, 80, PIT_MAX, 20, corr.data() + PIT_MAX);
+    EXPECT_EQ(corr[PIT_MAX - 20], MAX_32);
+    EXPECT_EQ(corr[PIT_MAX - 21], MIN_32);
+    EXPECT_EQ(corr[PIT_MAX - 143], MIN_32);
+}
