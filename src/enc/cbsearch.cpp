@@ -347,10 +347,17 @@ void vamrnbe_cor_h_x(const int16_t *h, const int16_t *x, int16_t *dn, int32_t sf
 }
 
 void vamrnbe_cor_h_sign(const int16_t *h2, const int16_t *sign, int16_t *rr) {
+    // When twice the energy of h2 stays below the 32-bit maximum, no running
+    // sum below (diagonal or, by Cauchy-Schwarz, off-diagonal) can saturate,
+    // and plain integer sums give the saturating results.
+    int64_t energy = 0;
+    for (int k = 0; k < L_CODE; ++k) energy += int32_t{h2[k]} * h2[k];
+    const bool exact = 2 * energy <= MAX_32;
+
     // Diagonal: energies of the tails of h2, without signs.
     Word32 s = 0;
     for (int k = 0, i = L_CODE - 1; k < L_CODE; ++k, --i) {
-        s = l_mac(s, h2[k], h2[k]);
+        s = exact ? s + 2 * (int32_t{h2[k]} * h2[k]) : l_mac(s, h2[k], h2[k]);
         rr[i * L_CODE + i] = round16(s);
     }
     // Off-diagonals, built from the end of the subframe backwards.
@@ -359,7 +366,7 @@ void vamrnbe_cor_h_sign(const int16_t *h2, const int16_t *sign, int16_t *rr) {
         int j = L_CODE - 1;
         int i = j - dec;
         for (int k = 0; k < L_CODE - dec; ++k, --i, --j) {
-            s = l_mac(s, h2[k], h2[k + dec]);
+            s = exact ? s + 2 * (int32_t{h2[k]} * h2[k + dec]) : l_mac(s, h2[k], h2[k + dec]);
             const Word16 v = mult(round16(s), mult(sign[i], sign[j]));
             rr[j * L_CODE + i] = v;
             rr[i * L_CODE + j] = v;

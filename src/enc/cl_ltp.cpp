@@ -13,6 +13,7 @@
 
 #include "basic_op/ext_op.h"
 #include "lpc/dsp.h"
+#include "lpc/enc_kernels.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
@@ -165,6 +166,32 @@ Word16 pitch_fr(subfr_state *ss, int32_t mode, const Word16 T_op[2], const Word1
     *resu3 = p.flag3;
     *pit_frac = frac;
     return lag;
+}
+
+// Sum of squares of one subframe, exact.
+inline int64_t sum_squares(const Word16 *x) {
+    int64_t e = 0;
+    for (int j = 0; j < L_SUBFR; ++j) e += int32_t{x[j]} * x[j];
+    return e;
+}
+
+// The saturating accumulation of 2*x[j]^2 from 0: every term is
+// non-negative, so it is the exact sum clamped to the 32-bit maximum.
+inline Word32 energy_from(int64_t sum_sq) {
+    return sum_sq > (MAX_32 >> 1) ? MAX_32 : static_cast<Word32>(2 * sum_sq);
+}
+
+// The saturating accumulation of 2*x[j]*y[j] from 0.  When the energies
+// guarantee that no partial sum reaches the rails (Cauchy-Schwarz) the
+// plain sum is the same and may be formed in any order.
+inline Word32 dot_from(const Word16 *x, const Word16 *y, int64_t ex, int64_t ey) {
+    Word32 s = 0;
+    if (enc_kernel::no_saturation(ex, ey)) {
+        for (int j = 0; j < L_SUBFR; ++j) s += 2 * (int32_t{x[j]} * y[j]);
+    } else {
+        for (int j = 0; j < L_SUBFR; ++j) s = l_mac(s, x[j], y[j]);
+    }
+    return s;
 }
 
 // One saturating multiply-accumulate that also reports saturation.
@@ -333,26 +360,21 @@ void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t
     vamrnbe_convolve(exc - t_min, h, excf);
 
     // Work on excf/4 when its energy is large, to keep the sums in range.
-    Word32 s = 0;
-    for (int j = 0; j < L_SUBFR; ++j) s = l_mac(s, excf[j], excf[j]);
     Word16 h_fac = 15 - 12;
     Word16 scaling = 0;
-    if (s > 67108864L) {
+    if (energy_from(sum_squares(excf)) > 67108864L) {
         for (int j = 0; j < L_SUBFR; ++j) excf[j] = shr(excf[j], 2);
         h_fac = 15 - 12 - 2;
         scaling = 2;
     }
 
+    const int64_t xn_sq = sum_squares(xn);
     int k = -t_min;
     for (int32_t lag = t_min; lag <= t_max; ++lag) {
         Word16 norm_h, norm_l_, corr_h, corr_l;
-        s = 0;
-        for (int j = 0; j < L_SUBFR; ++j) s = l_mac(s, excf[j], excf[j]);
-        l_extract(vamrnb_inv_sqrt(s), &norm_h, &norm_l_);
-
-        s = 0;
-        for (int j = 0; j < L_SUBFR; ++j) s = l_mac(s, xn[j], excf[j]);
-        l_extract(s, &corr_h, &corr_l);
+        const int64_t excf_sq = sum_squares(excf);
+        l_extract(vamrnb_inv_sqrt(energy_from(excf_sq)), &norm_h, &norm_l_);
+        l_extract(dot_from(xn, excf, xn_sq, excf_sq), &corr_h, &corr_l);
 
         corr[lag - t_min] = extract_h(l_shl(mpy_32(corr_h, corr_l, norm_h, norm_l_), 16));
 

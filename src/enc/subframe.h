@@ -31,7 +31,7 @@ VAMRNB_API void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y)
 
 // Normalised correlation of the target with the filtered past excitation for
 // every lag t_min..t_max; corr[k] belongs to lag t_min + k.  exc points at
-// the subframe's excitation (exc[-t_max-39..-1] is read).
+// the subframe's excitation; exc[-t_max .. 39 - t_min] is read.
 VAMRNB_API void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t *h,
                             int32_t t_min, int32_t t_max, int16_t *corr);
 
