@@ -49,7 +49,8 @@ struct subfr_state {
     Word16 onset;                   // onset counter, Q0
     Word16 prev_alpha;              // previous adaptation factor, Q15
     Word16 prev_gc;                 // previous code gain, Q1
-    Word16 ltpg_mem[LTPG_MEM];      // LTP coding gains, Q13 (slot 0 holds the newest)
+    Word16 ltpg_mem[LTPG_MEM];      // LTP coding gains, Q13: [1..4] the last four,
+                                    // [0] takes the current one for the median
 };
 
 // Lives one frame (part of the per-frame work record).
