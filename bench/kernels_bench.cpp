@@ -139,6 +139,20 @@ void BM_convolve(benchmark::State &state) {
     vamrnb_set_cpu_flags(before);
 }
 
+void BM_cor_h_x(benchmark::State &state) {
+    const DspKernels *k = kernels(state);
+    if (!k) return;
+    const Data &d = data();
+    int16_t dn[40];
+    const uint32_t before = vamrnb_set_cpu_flags(static_cast<uint32_t>(state.range(0)));
+    for (auto _ : state) {
+        if (k->cor_h_x) k->cor_h_x(d.y, d.x, dn, 1);
+        else vamrnbe_cor_h_x(d.y, d.x, dn, 1);
+        benchmark::DoNotOptimize(dn);
+    }
+    vamrnb_set_cpu_flags(before);
+}
+
 void BM_vq_subvec4_512(benchmark::State &state) {
     const DspKernels *k = kernels(state);
     if (!k) return;
@@ -168,4 +182,5 @@ BENCHMARK(BM_energy)->Apply(sets);
 BENCHMARK(BM_inner_product)->Apply(sets);
 BENCHMARK(BM_comp_corr)->Apply(sets);
 BENCHMARK(BM_convolve)->Apply(sets);
+BENCHMARK(BM_cor_h_x)->Apply(sets);
 BENCHMARK(BM_vq_subvec4_512)->Apply(sets);

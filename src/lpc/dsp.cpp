@@ -12,24 +12,24 @@ namespace {
 
 constexpr DspKernels kScalar = {
     syn_filt_c, syn_filt_m_c, residu_c, pred_lt_3or6_c, energy_c, inner_product_c,
-    nullptr, nullptr, nullptr, nullptr, nullptr,
+    nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
 };
 
 #if defined(VAMRNB_DSP_X86)
 constexpr DspKernels kSse41 = {
     syn_filt_c, syn_filt_m_sse41, residu_sse41, pred_lt_3or6_sse41, energy_sse41,
     inner_product_sse41, comp_corr_sse41, convolve_sse41,
-    vq_subvec_sse41, vq_subvec_s_sse41, vq_subvec4_sse41,
+    vq_subvec_sse41, vq_subvec_s_sse41, vq_subvec4_sse41, cor_h_x_sse41,
 };
 constexpr DspKernels kSse41Avx2 = {
     syn_filt_c, syn_filt_m_sse41, residu_avx2, pred_lt_3or6_avx2, energy_sse41,
     inner_product_sse41, comp_corr_avx2, convolve_avx2,
-    vq_subvec_sse41, vq_subvec_s_sse41, vq_subvec4_sse41,
+    vq_subvec_sse41, vq_subvec_s_sse41, vq_subvec4_sse41, cor_h_x_avx2,
 };
 // AVX2 allowed while SSE4.1 is masked off: only the AVX2 kernels.
 constexpr DspKernels kAvx2Only = {
     syn_filt_c, syn_filt_m_c, residu_avx2, pred_lt_3or6_avx2, energy_c, inner_product_c,
-    comp_corr_avx2, convolve_avx2, nullptr, nullptr, nullptr,
+    comp_corr_avx2, convolve_avx2, nullptr, nullptr, nullptr, cor_h_x_avx2,
 };
 #endif
 
@@ -37,7 +37,7 @@ constexpr DspKernels kAvx2Only = {
 constexpr DspKernels kNeon = {
     syn_filt_neon, syn_filt_m_neon, residu_neon, pred_lt_3or6_neon, energy_neon,
     inner_product_neon, comp_corr_neon, convolve_neon,
-    vq_subvec_neon, vq_subvec_s_neon, vq_subvec4_neon,
+    vq_subvec_neon, vq_subvec_s_neon, vq_subvec4_neon, cor_h_x_neon,
 };
 #endif
 

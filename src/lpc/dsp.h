@@ -26,6 +26,7 @@ using CompCorrFn = void (*)(const Word16 *x, Word32 len, Word32 lag_max, Word32 
 using ConvolveFn = void (*)(const Word16 *x, const Word16 *h, Word16 *y);
 using VqSubvecFn = int16_t (*)(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
                                const Word16 *w2, Word32 size);
+using CorHxFn = void (*)(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
 using VqSubvec4Fn = int16_t (*)(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
 
 struct DspKernels {
@@ -44,6 +45,7 @@ struct DspKernels {
     VqSubvecFn vq_subvec;   // as vamrnbe_vq_subvec
     VqSubvecFn vq_subvec_s; // as vamrnbe_vq_subvec_s
     VqSubvec4Fn vq_subvec4; // as vamrnbe_vq_subvec4
+    CorHxFn cor_h_x;        // as vamrnbe_cor_h_x
 };
 
 // The kernel set in use (selected on first call).
@@ -74,6 +76,8 @@ Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init);
 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
 void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
 void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y);
+void cor_h_x_sse41(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
+void cor_h_x_avx2(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
 int16_t vq_subvec_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
                         const Word16 *w2, Word32 size);
 int16_t vq_subvec_s_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
@@ -95,6 +99,7 @@ Word32 energy_neon(const Word16 *x, Word32 n, Word32 init);
 Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
 void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
 void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y);
+void cor_h_x_neon(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
 int16_t vq_subvec_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
                        const Word16 *w2, Word32 size);
 int16_t vq_subvec_s_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,

@@ -60,6 +60,38 @@ inline void convolve_sat(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+// ---- backward filtering of the target (codebook search) ---------------------
+// y[i] = sum_{j >= i} 2·x[j]·h[j-i], i = 0..39, then scaled so that the sum of
+// the five track maxima (tracks of step 5) is normalised, minus sf bits.
+
+inline void cor_h_x_sat(const Word16 *h, const Word16 *x, Word32 y[40]) {
+    for (int i = 0; i < 40; ++i) {
+        Word32 s = 0;
+        for (int j = i; j < 40; ++j) s = l_mac(s, x[j], h[j - i]);
+        y[i] = s;
+    }
+}
+
+inline void cor_h_x_scale(const Word32 y[40], Word16 *dn, Word32 sf) {
+    Word32 tot = 5;
+    for (int k = 0; k < 5; ++k) {
+        Word32 max = 0;
+        for (int i = k; i < 40; i += 5) {
+            const Word32 a = l_abs(y[i]);
+            if (a > max) max = a;
+        }
+        tot = l_add(tot, l_shr(max, 1));
+    }
+    const Word16 j = sub(norm_l(tot), static_cast<Word16>(sf));
+    for (int i = 0; i < 40; ++i) dn[i] = round16(l_shl(y[i], j));
+}
+
+// h reversed and padded for lane-parallel backward filtering: q[39 - m] = h[m]
+// for m = 0..39, zeros after, so that lane i+k of step j reads q[39 + i + k - j].
+inline void cor_h_x_reverse(const Word16 *h, Word16 *q, int len) {
+    for (int t = 0; t < len; ++t) q[t] = t < 40 ? h[39 - t] : 0;
+}
+
 // ---- split-VQ searches ------------------------------------------------------
 // A 4-component row search: the weighted distance of (r - row) (or of
 // (r + row) for the negated rows of the signed search) is

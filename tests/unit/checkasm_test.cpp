@@ -211,12 +211,20 @@ TEST(Checkasm, EncoderCorrelations) {
         g.fill(x, 40, t);
         g.fill(h, 40, t / 4 + 2);
         if (t % 5 == 0) h[0] = 4096;
+        int16_t dn_ref[40];
+        const int32_t sf = 1 + t % 2;
         vamrnbe_convolve(x, h, ref);
+        vamrnbe_cor_h_x(h, x, dn_ref, sf);
         for (const auto &v : vs) {
-            if (!v.k->convolve) continue;
             int16_t out[40];
-            v.k->convolve(x, h, out);
-            ASSERT_EQ(0, std::memcmp(out, ref, sizeof out)) << v.name << " t=" << t;
+            if (v.k->convolve) {
+                v.k->convolve(x, h, out);
+                ASSERT_EQ(0, std::memcmp(out, ref, sizeof out)) << v.name << " t=" << t;
+            }
+            if (v.k->cor_h_x) {
+                v.k->cor_h_x(h, x, out, sf);
+                ASSERT_EQ(0, std::memcmp(out, dn_ref, sizeof out)) << v.name << " cor_h_x t=" << t;
+            }
         }
     }
     vamrnb_set_cpu_flags(before);

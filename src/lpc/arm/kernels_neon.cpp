@@ -202,6 +202,26 @@ void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+void cor_h_x_neon(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf) {
+    Word32 y[L_SUBFR];
+    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
+        enc_kernel::cor_h_x_sat(h, x, y);
+    } else {
+        Word16 q[2 * L_SUBFR + 8];
+        enc_kernel::cor_h_x_reverse(h, q, 2 * L_SUBFR + 8);
+        for (int i = 0; i < L_SUBFR; i += 8) {
+            int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
+            for (int j = i; j < L_SUBFR; ++j) {
+                lo = vmlal_n_s16(lo, vld1_s16(q + 39 + i - j), x[j]);
+                hi = vmlal_n_s16(hi, vld1_s16(q + 43 + i - j), x[j]);
+            }
+            vst1q_s32(y + i, vshlq_n_s32(lo, 1));
+            vst1q_s32(y + i + 4, vshlq_n_s32(hi, 1));
+        }
+    }
+    enc_kernel::cor_h_x_scale(y, dn, sf);
+}
+
 namespace {
 
 // Row sums of four squares for two rows held in one register.

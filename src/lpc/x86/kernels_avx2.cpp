@@ -135,6 +135,29 @@ VAMRNB_AVX2 void convolve_avx2(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+VAMRNB_AVX2 void cor_h_x_avx2(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf) {
+    Word32 y[L_SUBFR];
+    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
+        enc_kernel::cor_h_x_sat(h, x, y);
+    } else {
+        alignas(32) Word16 q[2 * L_SUBFR + 16];
+        enc_kernel::cor_h_x_reverse(h, q, 2 * L_SUBFR + 16);
+        for (int i = 0; i < L_SUBFR; i += 8) {
+            __m256i acc = _mm256_setzero_si256();
+            for (int j = i; j < L_SUBFR; j += 2) {
+                const __m128i q0 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(q + 39 + i - j));
+                const __m128i q1 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(q + 38 + i - j));
+                const __m256i qq = _mm256_set_m128i(_mm_unpackhi_epi16(q0, q1), _mm_unpacklo_epi16(q0, q1));
+                const int32_t xp = static_cast<int32_t>(static_cast<uint16_t>(x[j]) |
+                                                        (static_cast<uint32_t>(static_cast<uint16_t>(x[j + 1])) << 16));
+                acc = _mm256_add_epi32(acc, _mm256_madd_epi16(qq, _mm256_set1_epi32(xp)));
+            }
+            _mm256_storeu_si256(reinterpret_cast<__m256i *>(y + i), _mm256_slli_epi32(acc, 1));
+        }
+    }
+    enc_kernel::cor_h_x_scale(y, dn, sf);
+}
+
 }  // namespace vamrnb
 
 #endif  // VAMRNB_DSP_X86

@@ -261,6 +261,26 @@ VAMRNB_SSE41 void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+VAMRNB_SSE41 void cor_h_x_sse41(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf) {
+    Word32 y[L_SUBFR];
+    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
+        enc_kernel::cor_h_x_sat(h, x, y);
+    } else {
+        alignas(16) Word16 q[2 * L_SUBFR + 8];
+        enc_kernel::cor_h_x_reverse(h, q, 2 * L_SUBFR + 8);
+        for (int i = 0; i < L_SUBFR; i += 4) {
+            __m128i acc = _mm_setzero_si128();
+            for (int j = i & ~1; j < L_SUBFR; j += 2) {
+                const __m128i q0 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(q + 39 + i - j));
+                const __m128i q1 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(q + 38 + i - j));
+                acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_unpacklo_epi16(q0, q1), pair16(x[j], x[j + 1])));
+            }
+            _mm_storeu_si128(reinterpret_cast<__m128i *>(y + i), _mm_slli_epi32(acc, 1));
+        }
+    }
+    enc_kernel::cor_h_x_scale(y, dn, sf);
+}
+
 namespace {
 
 // mult(w, d) on eight lanes: the high 17 bits of the 32-bit product; the
