@@ -8,6 +8,7 @@
 // spectral detector.
 #include "enc/enc_state.h"
 #include "basic_op/ext_op.h"
+#include "lpc/dsp.h"
 #include "lpc/tables.h"
 
 using namespace vamrnb;
@@ -268,6 +269,11 @@ Word16 ol_ltp(enc_state *st, int32_t mode, const Word16 *wsp, int len, int idx,
 
 extern "C" void vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max,
                                   int32_t lag_min, int32_t *corr) {
+    // A vector version with identical results takes over where available.
+    if (const CompCorrFn vec = dsp().comp_corr) {
+        vec(x, len, lag_max, lag_min, corr);
+        return;
+    }
     // Every partial sum of 2 x[j] x[j-lag] is bounded by the doubled energy of
     // the whole span x[-lag_max .. len-1].  When that fits in 32 bits no
     // step of the saturating sum can clip, and plain products give the same

@@ -5,6 +5,7 @@
 // here also serve the two-vector split-matrix quantiser that the LP analysis
 // runs inline for MR122.
 #include "enc/enc_state.h"
+#include "lpc/dsp.h"
 #include "lpc/tables.h"
 
 using namespace vamrnb;
@@ -59,8 +60,12 @@ void lsf_wt(const Word16 lsf[M], Word16 wf[M]) {
 
 }  // namespace vamrnb
 
+// Each search kernel hands the call to a vector version with identical
+// results where the processor has one.
+
 extern "C" int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int16_t *w,
                                       int32_t size) {
+    if (const auto vec = dsp().vq_subvec4) return vec(r, dico, w, size);
     Word32 best = MAX_32;
     int index = 0;
     const Word16 *row = dico;
@@ -81,6 +86,7 @@ extern "C" int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int
 
 extern "C" int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *dico,
                                      const int16_t *w1, const int16_t *w2, int32_t size) {
+    if (const auto vec = dsp().vq_subvec) return vec(r1, r2, dico, w1, w2, size);
     Word32 best = MAX_32;
     int index = 0;
     const Word16 *row = dico;
@@ -104,6 +110,7 @@ extern "C" int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *di
 
 extern "C" int16_t vamrnbe_vq_subvec_s(int16_t *r1, int16_t *r2, const int16_t *dico,
                                        const int16_t *w1, const int16_t *w2, int32_t size) {
+    if (const auto vec = dsp().vq_subvec_s) return vec(r1, r2, dico, w1, w2, size);
     Word32 best = MAX_32;
     int index = 0;
     int sign = 0;
