@@ -8,6 +8,7 @@
 // where it saturates, through sat16 / sat32.
 #pragma once
 
+#include <bit>
 #include <cstdint>
 #include <type_traits>
 
@@ -110,15 +111,10 @@ constexpr Word32 l_shl(Word32 L, Word32 n) {
         const Word32 s = -static_cast<int64_t>(n) > 31 ? 31 : -n;
         return L >> s;
     }
-    // Any non-zero value saturates within 31 doublings; zero stays zero, so
-    // the loop never has to run the full (possibly huge) count.
+    // Zero stays zero; any other value saturates after at most 31 doublings.
     if (L == 0) return 0;
-    for (; n > 0; --n) {
-        if (L > 0x3fffffff) return MAX_32;
-        if (L < -0x40000000) return MIN_32;
-        L *= 2;
-    }
-    return L;
+    if (n > 30) return L > 0 ? MAX_32 : MIN_32;
+    return sat32(static_cast<int64_t>(L) * (int64_t{1} << n));
 }
 
 constexpr Word32 l_shr(Word32 L, Word32 n) {
@@ -143,19 +139,15 @@ constexpr Word32 l_shr_r(Word32 L, Word32 n) {
 constexpr Word16 norm_s(Word16 a) {
     if (a == 0) return 0;
     if (a == -1) return 15;
-    Word32 v = a < 0 ? ~Word32{a} : Word32{a};
-    Word16 n = 0;
-    while (v < 0x4000) { v <<= 1; ++n; }
-    return n;
+    const auto v = static_cast<uint16_t>(a < 0 ? ~a : a);
+    return static_cast<Word16>(std::countl_zero(v) - 1);
 }
 
 constexpr Word16 norm_l(Word32 L) {
     if (L == 0) return 0;
     if (L == -1) return 31;
-    uint32_t v = static_cast<uint32_t>(L < 0 ? ~L : L);
-    Word16 n = 0;
-    while (v < 0x40000000u) { v <<= 1; ++n; }
-    return n;
+    const auto v = static_cast<uint32_t>(L < 0 ? ~L : L);
+    return static_cast<Word16>(std::countl_zero(v) - 1);
 }
 
 // Prints the standard's diagnostics for invalid div_s arguments (never inline).
