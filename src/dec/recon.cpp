@@ -57,9 +57,9 @@ extern "C" int32_t vamrnbd_recon(int16_t samples[160], const codec_config *confi
     const int32_t ch_setting = config->dec.channels;
     static constexpr uint32_t bits_of[4] = {16, 8, 16, 24};
     if (format > 3) return AMRNB_ERR_UNSUPPORTED;
-    if (format != 0 && ch_setting != 1 && ch_setting != 2) return AMRNB_ERR_UNSUPPORTED;
     const uint32_t bps = bits_of[format];
     out->bits_per_sample = bps;
+    if (format != 0 && ch_setting != 1 && ch_setting != 2) return AMRNB_ERR_UNSUPPORTED;
 
     if (ch_setting == 2)
         out->channels = 2;
