@@ -49,7 +49,7 @@ struct vamrnb_encoder {
     vamrnb_encoder *self;              // own address once creation succeeded
     codec_config config;               // copy of the caller's four words;
                                        // config.enc.mode is the requested mode
-    vamrnb::enc_frame *frame;          // work record, may be null (see create)
+    vamrnb::enc_frame *frame;          // work record, allocated with the instance
 
     vamrnb::dtx_enc_state dtx;         // DTX history and SID indices
     vamrnb::vad_area vad;              // whichever detector is configured
@@ -116,7 +116,7 @@ struct enc_frame {
     subfr_frame sub;
 };
 
-// Start of the frame being coded and of its excitation.
+// Start of the frame being coded, of its excitation and of its weighted speech.
 inline Word16 *enc_speech(enc_state *st) { return st->old_speech + ENC_SPEECH; }
 inline Word16 *enc_exc(enc_state *st) { return st->old_exc + ENC_EXC; }
 inline Word16 *enc_wsp(enc_state *st) { return st->old_wsp + ENC_WSP; }

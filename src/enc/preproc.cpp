@@ -38,8 +38,6 @@ extern "C" void vamrnbe_preproc(enc_state *st, enc_frame * /*fr*/, int16_t *in) 
     for (int i = 0; i < L_FRAME; ++i)
         in[i] = static_cast<Word16>(in[i] & ~7);
 
-    // Each input sample is read before its output is stored, so the filter is
-    // also correct when the caller hands in the history itself.
     for (int i = 0; i < L_FRAME; ++i)
         out[i] = hp_step(st, in[i]);
 }
