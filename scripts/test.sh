@@ -8,7 +8,9 @@ cd "$(dirname "$0")/.."
 source scripts/setup-deps.sh
 vamrnb_setup_deps
 
-cmake -S . -B build -DCMAKE_BUILD_TYPE=Release -DVAMRNB_BUILD_TESTS=ON "$@"
+# Conformance switches follow the project defaults, not a stale cache.
+cmake -S . -B build -DCMAKE_BUILD_TYPE=Release -DVAMRNB_BUILD_TESTS=ON \
+    -U "VAMRNB_CONFORMANCE_*" "$@"
 cmake --build build -j2
 ctest --test-dir build --output-on-failure -j2
 
