@@ -16,7 +16,7 @@ constexpr std::size_t kPtr = sizeof(void *);
 constexpr std::size_t kExtra = 32 + kPtr;  // 36 bytes with 4-byte pointers
 
 void *alloc_aligned(uint32_t size) {
-    if (size > SIZE_MAX - kExtra) return nullptr;
+    if (uint64_t{size} + kExtra > SIZE_MAX) return nullptr;  // only possible with a 32-bit size_t
     void *raw = std::malloc(std::size_t{size} + kExtra);
     if (!raw) return nullptr;
     const uintptr_t base = reinterpret_cast<uintptr_t>(raw);

@@ -7,6 +7,7 @@
 #include <cstring>
 
 #include "dec/dec_state.h"
+#include "dec/dtx_dec.h"
 
 #include "common/bitstream.h"
 #include "dec/d_plsf.h"
@@ -24,29 +25,9 @@ dec_state *as_state(vamrnb_decoder *dec) { return reinterpret_cast<dec_state *>(
 
 // Initial values of the comfort-noise state.
 void reset_cn(dec_state *st) {
-    dtx_dec_state *cn = &st->cn;
-    cn->since_last_sid = 0;
-    cn->true_sid_period_inv = 1 << 13;
-    cn->log_en = 3500;
-    cn->old_log_en = 3500;
-    cn->L_pn_seed_rx = 0x70816958;
-    std::memcpy(cn->lsp, vamrnb_tbl_lsp_init_data, sizeof cn->lsp);
+    dtx_dec_reset(&st->cn);
     if (st->work != nullptr)
         std::memcpy(st->work->cn_lsp_old, vamrnb_tbl_lsp_init_data, sizeof st->work->cn_lsp_old);
-    cn->lsf_hist_ptr = 0;
-    cn->log_pg_mean = 0;
-    cn->log_en_hist_ptr = 0;
-    for (int i = 0; i < 8; ++i) std::memcpy(cn->lsf_hist + 10 * i, vamrnb_tbl_mean_lsf, 10 * sizeof(Word16));
-    std::memset(cn->lsf_hist_mean, 0, sizeof cn->lsf_hist_mean);
-    for (auto &e : cn->log_en_hist) e = cn->log_en;
-    cn->log_en_adjust = 0;
-    cn->dtxHangoverCount = 7;
-    cn->decAnaElapsedCount = 32767;
-    cn->sid_frame = 0;
-    cn->valid_data = 0;
-    cn->dtxHangoverAdded = 0;
-    cn->dtxGlobalState = DTX;
-    cn->data_updated = 0;
 }
 
 void reset_post(dec_state *st) {
