@@ -1,6 +1,5 @@
 // Decoder stages in isolation: pitch-lag decoding and its concealment, the
-// pitch-gain table and the gain concealment histories, the pulse codebooks,
-// and the LSF average.
+// gain concealment histories and the pulse codebooks.
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -109,13 +108,6 @@ TEST(DecoderLag, BadFrameInBackgroundNoiseUsesReceivedLagInLowModes) {
     EXPECT_EQ(d.lag(MR475, 0, 100).first, 61);
 }
 
-TEST(DecoderGain, PitchGainTable) {
-    EXPECT_EQ(vamrnbd_d_gain_pitch(MR122, 15), 19660);
-    EXPECT_EQ(vamrnbd_d_gain_pitch(MR795, 15), 19661);
-    EXPECT_EQ(vamrnbd_d_gain_pitch(MR122, 1), 3276);
-    EXPECT_EQ(vamrnbd_d_gain_pitch(MR122, 0), 0);
-}
-
 TEST(DecoderGain, PitchHistoryIsClampedAndLimitedAfterBadFrame) {
     Decoder d;
     int16_t g = 19661;
@@ -212,19 +204,6 @@ TEST(DecoderCodebook, PitchSharpeningAddsDelayedPulses) {
     EXPECT_EQ(d.w->code[1], 8191);
     EXPECT_EQ(d.w->code[20], 4095);
     EXPECT_EQ(d.w->code[21], 4095);
-}
-
-TEST(DecoderLsf, AverageMovesSixteenPercent) {
-    int16_t mean[10], cur[10];
-    for (int i = 0; i < 10; ++i) {
-        mean[i] = static_cast<int16_t>(1000 * (i + 1));
-        cur[i] = static_cast<int16_t>(1000 * (i + 1) + 100 * (i - 5));
-    }
-    int16_t expect[10];
-    for (int i = 0; i < 10; ++i)
-        expect[i] = static_cast<int16_t>((mean[i] * 55050 + cur[i] * 10486 + 32768) >> 16);
-    vamrnbd_lsp_avg(cur, mean);
-    for (int i = 0; i < 10; ++i) EXPECT_EQ(mean[i], expect[i]) << i;
 }
 
 }  // namespace

@@ -233,13 +233,13 @@ TEST(DtxEncoder, SilenceFromTheStart) {
         auto sid = e.silent_frame();
         ASSERT_EQ(sid.size(), 6u);
         EXPECT_EQ(sid[0], 0x44);
-        EXPECT_EQ(sid[5] & 0x1e, 0x0a);   // STI 0, mode 5 sent as 1, 0, 1
+        EXPECT_EQ(sid[5] & 0x1f, 0x0a);   // STI 0, mode 5 sent as 1, 0, 1, zero pad
         EXPECT_EQ(e.silent_frame(), std::vector<uint8_t>{0x7c});
         EXPECT_EQ(e.silent_frame(), std::vector<uint8_t>{0x7c});
         vamrnbe_set_mode(e.enc, 2);
         auto upd = e.silent_frame();
         ASSERT_EQ(upd.size(), 6u);
-        EXPECT_EQ(upd[5] & 0x1e, 0x14);   // STI 1, mode 2 sent as 0, 1, 0
+        EXPECT_EQ(upd[5] & 0x1f, 0x14);   // STI 1, mode 2 sent as 0, 1, 0
         EXPECT_TRUE(std::equal(sid.begin() + 1, sid.begin() + 5, upd.begin() + 1));
     }
 }

@@ -147,65 +147,6 @@ TEST(Residu, MatchesWideModelAndSaturates) {
     EXPECT_EQ(y[2], 4096);
 }
 
-TEST(WeightA, RoundsEachCoefficientForEveryOrder) {
-    int16_t a[21], fac[20], ap[21];
-    std::mt19937 rng(5);
-    for (auto &v : a) v = static_cast<int16_t>(rng());
-    for (auto &v : fac) v = static_cast<int16_t>(rng() & 0x7fff);
-    a[1] = fac[0] = -32768;   // the one product that leaves 16 bits: it wraps
-    for (int m : {10, 16, 20}) {
-        std::fill(ap, ap + 21, int16_t{0x1234});
-        vamrnb_weight_a(a, fac, m, ap);
-        EXPECT_EQ(ap[0], a[0]);
-        EXPECT_EQ(ap[1], -32768);
-        for (int i = 2; i <= m; ++i)
-            EXPECT_EQ(ap[i], static_cast<int16_t>((a[i] * fac[i - 1] + 0x4000) >> 15)) << m << " " << i;
-        EXPECT_EQ(ap[std::min(m + 1, 20)], m < 20 ? 0x1234 : ap[20]);
-    }
-}
-
-namespace {
-
-// Interpolated excitation, sample by sample in place, with 64-bit sums
-// clamped after every step.
-void pred_lt_model(int T0, int frac, int flag3, int16_t *exc) {
-    int f = -frac;
-    if (flag3) f *= 2;
-    int base = -T0;
-    if (f < 0) {
-        f += 6;
-        --base;
-    }
-    for (int j = 0; j < 40; ++j) {
-        int32_t s = 0;
-        for (int i = 0; i < 10; ++i) {
-            s = clamp32(int64_t{s} + 2 * int64_t{exc[base + j - i]} * vamrnb_tbl_pred_inter_6[f + 6 * i]);
-            s = clamp32(int64_t{s} + 2 * int64_t{exc[base + j + 1 + i]} *
-                                         vamrnb_tbl_pred_inter_6[6 - f + 6 * i]);
-        }
-        exc[j] = static_cast<int16_t>(clamp32(int64_t{s} + 0x8000) >> 16);
-    }
-}
-
-}  // namespace
-
-TEST(PredLt, EveryFractionShortAndLongDelays) {
-    std::mt19937 rng(6);
-    std::uniform_int_distribution<int> d(-32768, 32767);
-    for (int T0 : {18, 19, 20, 25, 39, 40, 41, 100, 143}) {
-        for (int flag3 : {0, 1}) {
-            for (int frac = flag3 ? -1 : -2; frac <= (flag3 ? 1 : 3); ++frac) {
-                int16_t buf[200], model[200];
-                for (auto &v : buf) v = static_cast<int16_t>(d(rng) >> (T0 % 3 == 0 ? 0 : 2));
-                std::memcpy(model, buf, sizeof buf);
-                vamrnb_pred_lt_3or6(T0, frac, flag3, buf + 155);
-                pred_lt_model(T0, frac, flag3, model + 155);
-                ASSERT_EQ(0, std::memcmp(buf, model, sizeof buf)) << T0 << " " << frac << " " << flag3;
-            }
-        }
-    }
-}
-
 // With a delay of 20 the second half of the subframe is interpolated from the
 // first half just written.  The history before the subframe is a constant
 // 1000 and the subframe itself starts out as zeros: reading those stale zeros

@@ -1,4 +1,4 @@
-// LSF/LSP/LPC conversions, interpolation and the decoder's LSF dequantisers.
+// LSF/LSP/LPC conversions and the LSF dequantisers' bad-frame concealment.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -115,78 +115,6 @@ TEST(LspAz, MatchesDoublePrecisionExpansion) {
     }
 }
 
-// Sets built from the same LSPs are identical; the interpolated sets are the
-// conversions of the shifted sums.
-TEST(IntLpc, SubframeSets) {
-    std::mt19937 rng(3);
-    Word16 f[3][10], lsp[3][10];
-    for (int k = 0; k < 3; ++k) {
-        random_lsf(rng, f[k]);
-        vamrnb_sf_sp(f[k], vamrnb_tbl_cos_lsp_lsf, lsp[k]);
-    }
-    const Word16 *old_ = lsp[0], *mid = lsp[1], *nw = lsp[2];
-    auto az_of = [](const Word16 *x, const Word16 *y, int sx, int sy, Word16 out[11]) {
-        Word16 v[10];   // x - (x >> sx) + (y >> sy), or x >> 1 + y >> 1 when sx = 1
-        for (int i = 0; i < 10; ++i)
-            v[i] = static_cast<Word16>(sx == 1 ? (x[i] >> 1) + (y[i] >> 1) : x[i] - (x[i] >> sx) + (y[i] >> sy));
-        vamrnb_lsp_az(v, out);
-    };
-    Word16 az[44], want[4][11];
-
-    // Unchanged LSPs: the 3/4-1/4 sets are exact; the halves lose the odd LSB.
-    vamrnb_int_lpc_1to3(nw, nw, az);
-    vamrnb_lsp_az(nw, want[0]);
-    for (int k : {0, 2, 3}) EXPECT_EQ(0, std::memcmp(az + 11 * k, want[0], 22)) << k;
-
-    vamrnb_int_lpc_1to3(old_, nw, az);
-    az_of(old_, nw, 2, 2, want[0]);
-    az_of(old_, nw, 1, 1, want[1]);
-    az_of(nw, old_, 2, 2, want[2]);
-    vamrnb_lsp_az(nw, want[3]);
-    EXPECT_EQ(0, std::memcmp(az, want, sizeof az));
-
-    vamrnb_int_lpc_1and3(old_, mid, nw, az);
-    az_of(mid, old_, 1, 1, want[0]);
-    vamrnb_lsp_az(mid, want[1]);
-    az_of(mid, nw, 1, 1, want[2]);
-    EXPECT_EQ(0, std::memcmp(az, want, sizeof az));
-}
-
-// ---- decoder dequantisers ---------------------------------------------------
-
-TEST(DPlsf3, CodebookChoiceByMode) {
-    Word16 past_lsf[10], past_r[10] = {}, lsp[10];
-    std::memcpy(past_lsf, vamrnb_tbl_mean_lsf, sizeof past_lsf);
-    struct Case { int mode; Word16 idx[3]; const Word16 *cb1; int row2; const Word16 *cb3; };
-    const Case cases[] = {
-        {0, {5, 255, 100}, tab::q_plsf_3_dico1_lsf, 510, tab::mr515_3_lsf},      // index 2 doubled
-        {5, {400, 255, 500}, tab::mr795_1_lsf, 255, tab::q_plsf_3_dico3_lsf},
-        {6, {200, 511, 511}, tab::q_plsf_3_dico1_lsf, 511, tab::q_plsf_3_dico3_lsf},
-    };
-    for (const auto &c : cases) {
-        vamrnbd_d_plsf_3(c.mode, 0, c.idx, past_lsf, past_r, lsp);
-        EXPECT_EQ(0, std::memcmp(past_r, c.cb1 + 3 * c.idx[0], 6)) << c.mode;
-        EXPECT_EQ(0, std::memcmp(past_r + 3, tab::q_plsf_3_dico2_lsf + 3 * c.row2, 6)) << c.mode;
-        EXPECT_EQ(0, std::memcmp(past_r + 6, c.cb3 + 4 * c.idx[2], 8)) << c.mode;
-    }
-}
-
-TEST(DPlsf3, DtxWithoutHistoryIsMeanPlusResidual) {
-    const Word16 idx[3] = {17, 300, 42};
-    Word16 past_lsf[10] = {}, past_r[10] = {}, lsp[10], want[10], want_lsp[10];
-    vamrnbd_d_plsf_3(8, 0, idx, past_lsf, past_r, lsp);
-    for (int i = 0; i < 10; ++i) {
-        const Word16 r = i < 3 ? tab::q_plsf_3_dico1_lsf[17 * 3 + i]
-                       : i < 6 ? tab::q_plsf_3_dico2_lsf[300 * 3 + i - 3]
-                               : tab::q_plsf_3_dico3_lsf[42 * 4 + i - 6];
-        want[i] = static_cast<Word16>(r + tab::q_plsf_3_mean_lsf[i]);
-    }
-    vamrnb_reorder(want);
-    vamrnb_sf_sp(want, vamrnb_tbl_cos_lsp_lsf, want_lsp);
-    EXPECT_EQ(0, std::memcmp(past_lsf, want, sizeof want));
-    EXPECT_EQ(0, std::memcmp(lsp, want_lsp, sizeof lsp));
-}
-
 namespace {
 
 double deviation(const Word16 *a, const Word16 *b) {
@@ -228,30 +156,4 @@ TEST(DPlsf, BadFramesConvergeToTheMean) {
             EXPECT_EQ(0, std::memcmp(lsp, lsp2, sizeof lsp));   // both sets concealed alike
         }
     }
-}
-
-TEST(DPlsf5, RowsSignAndTwoSets) {
-    Word16 past_lsf[10], past_r[10] = {}, lsp1[10], lsp2[10];
-    std::memcpy(past_lsf, vamrnb_tbl_mean_lsf, sizeof past_lsf);
-    const Word16 idx[5] = {3, 4, 1, 6, 7};   // split 3: row 0, negated
-    d_plsf_5(0, idx, past_lsf, past_r, lsp1, lsp2);
-    const Word16 *rows[5] = {&vamrnb_tbl_dico1_lsf[12], &vamrnb_tbl_dico2_lsf[16], &vamrnb_tbl_dico3_lsf[0],
-                             &vamrnb_tbl_dico4_lsf[24], &vamrnb_tbl_dico5_lsf[28]};
-    // With zero memory each set is the mean plus its half of the row.
-    Word16 f1[10], f2[10], w1[10], w2[10];
-    for (int k = 0; k < 5; ++k) {
-        const int s = k == 2 ? -1 : 1;
-        for (int j = 0; j < 2; ++j) {
-            EXPECT_EQ(past_r[2 * k + j], s * rows[k][2 + j]);
-            f1[2 * k + j] = static_cast<Word16>(vamrnb_tbl_mean_lsf[2 * k + j] + s * rows[k][j]);
-            f2[2 * k + j] = static_cast<Word16>(vamrnb_tbl_mean_lsf[2 * k + j] + s * rows[k][2 + j]);
-        }
-    }
-    vamrnb_reorder(f1);
-    vamrnb_reorder(f2);
-    vamrnb_sf_sp(f1, vamrnb_tbl_cos_lsp_lsf, w1);
-    vamrnb_sf_sp(f2, vamrnb_tbl_cos_lsp_lsf, w2);
-    EXPECT_EQ(0, std::memcmp(past_lsf, f2, sizeof f2));
-    EXPECT_EQ(0, std::memcmp(lsp1, w1, sizeof w1));
-    EXPECT_EQ(0, std::memcmp(lsp2, w2, sizeof w2));
 }
