@@ -71,18 +71,6 @@ TEST(EncLpc, AutocorrScalesDownOnOverflow) {
     EXPECT_EQ(r_h[5], 0);
 }
 
-TEST(EncLpc, WindowingAndLagWindowMatchStandAloneForms) {
-    std::vector<int16_t> x(240), y(240);
-    for (int i = 0; i < 240; ++i) x[i] = static_cast<int16_t>(3000 * std::sin(i * 0.3));
-    vamrnbe_windowing(x.data(), tab::window_200_40, y.data());
-    EXPECT_EQ(y[0], mult_r(x[0], 2621));
-    int16_t r_h[11], r_l[11];
-    vamrnbe_auto_corr(y.data(), r_h, r_l);
-    const int16_t h1 = r_h[1];
-    vamrnbe_lag_window(r_h, r_l);
-    EXPECT_LT(r_h[1], h1) << "the lag window attenuates lag 1";
-}
-
 TEST(EncLpc, LevinsonFallsBackToLastStableFilter) {
     int16_t old_A[11] = {4096, -100, 50, 0, 0, 0, 0, 0, 0, 0, 7};
     int16_t A[11], rc[4] = {1, 1, 1, 1};

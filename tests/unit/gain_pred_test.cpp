@@ -1,4 +1,4 @@
-// Code-gain prediction, its history update and the gain median.
+// Code-gain prediction and the gain median.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -91,21 +91,6 @@ TEST(GcPred, ZeroCodeVector) {
     for (int i = 0; i < 4; ++i) ener += 2 * tab::pred_MR122[i] * q122[i];
     EXPECT_EQ(e, ener >> 17);
     EXPECT_EQ(f, (ener >> 2) - (ener >> 17) * 32768);
-}
-
-TEST(GcPredUpdate, ShiftsBothHistories) {
-    int16_t q[4] = {1, 2, 3, 4}, q122[4] = {5, 6, 7, 8};
-    vamrnb_gc_pred_update(-7, 9, q, q122);
-    EXPECT_EQ(q[0], 9);
-    EXPECT_EQ(q[1], 1);
-    EXPECT_EQ(q[3], 3);
-    EXPECT_EQ(q122[0], -7);
-    EXPECT_EQ(q122[3], 7);
-    for (int k = 0; k < 4; ++k) vamrnb_gc_pred_update(static_cast<int16_t>(100 + k), static_cast<int16_t>(200 + k), q, q122);
-    for (int i = 0; i < 4; ++i) {
-        EXPECT_EQ(q[i], 203 - i);
-        EXPECT_EQ(q122[i], 103 - i);
-    }
 }
 
 TEST(GmedN, MedianOfOddCounts) {

@@ -73,27 +73,6 @@ TEST(Vad1, FilterBankPutsTonesInTheirBands) {
     }
 }
 
-// The level of a band covers the previous frame's look-ahead tail and the
-// whole current band signal; the tail is carried to the next frame, and
-// scale 15 (the top band) halves both.
-TEST(Vad1, LevelCalculationCarriesTheLookAhead) {
-    // Band 0 layout: step 16, start 0; samples 8 and 9 are the look-ahead.
-    Word16 a[160] = {}, b[160] = {};
-    for (int i = 0; i < 10; ++i) {
-        a[16 * i] = static_cast<Word16>(i < 8 ? 1000 : -300 * i);
-        b[16 * i] = static_cast<Word16>(i < 8 ? 100 : 5000);
-    }
-    const int tail_a = 2 * (2400 + 2700), whole_b = 2 * (8 * 100 + 2 * 5000);
-    for (int scale : {16, 15}) {
-        Word16 sub = 0;
-        vamrnbe_lev_calculation(a, 8, 10, 16, 0, scale, &sub);
-        EXPECT_EQ(sub, tail_a >> (16 - scale));
-        EXPECT_EQ(vamrnbe_lev_calculation(b, 8, 10, 16, 0, scale, &sub),
-                  (tail_a + whole_b) >> (16 - scale));
-        EXPECT_EQ(sub, (2 * 2 * 5000) >> (16 - scale));
-    }
-}
-
 // Frames below the power floor decide 0 and drop every pending hangover,
 // whatever the band SNRs say.
 TEST(Vad1, LowPowerForcesSilence) {
