@@ -31,14 +31,6 @@ struct Decoder {
     }
 };
 
-TEST(DecoderLag, Mr122AbsoluteCodeBoundary) {
-    Decoder d;
-    EXPECT_EQ(d.lag(MR122, 0, 462), std::make_pair(94, 3));
-    EXPECT_EQ(d.lag(MR122, 0, 463), std::make_pair(95, 0));
-    EXPECT_EQ(d.lag(MR122, 0, 0), std::make_pair(17, 3));    // 17 - 3/6 = 16.5
-    EXPECT_EQ(d.lag(MR122, 80, 511), std::make_pair(143, 0));  // third subframe is absolute too
-}
-
 TEST(DecoderLag, Mr122RelativeCodeAndInvalidIndices) {
     Decoder d;
     d.st->old_T0 = 100;  // window starts at 95
@@ -56,27 +48,6 @@ TEST(DecoderLag, Mr122RelativeCodeAndInvalidIndices) {
     EXPECT_EQ(d.lag(MR122, 40, 3), std::make_pair(134, 0));
     d.st->old_T0 = 18;  // and at the bottom to 18..27
     EXPECT_EQ(d.lag(MR122, 40, 3), std::make_pair(18, 0));
-}
-
-TEST(DecoderLag, ThirdResolutionCodes) {
-    Decoder d;
-    EXPECT_EQ(d.lag(MR74, 0, 196), std::make_pair(85, -1));
-    EXPECT_EQ(d.lag(MR74, 0, 197), std::make_pair(85, 0));
-    d.st->old_T0 = 60;  // 5-bit code, window 55..64
-    EXPECT_EQ(d.lag(MR74, 40, 2), std::make_pair(55, 0));
-    EXPECT_EQ(d.lag(MR74, 40, 31), std::make_pair(65, -1));
-    d.st->old_T0 = 60;  // MR795 uses a wider window, 50..69
-    EXPECT_EQ(d.lag(MR795, 40, 2), std::make_pair(50, 0));
-    // 4-bit code: whole lags below, thirds around, whole lags above
-    d.st->old_T0 = 60;
-    EXPECT_EQ(d.lag(MR59, 40, 0), std::make_pair(55, 0));
-    EXPECT_EQ(d.lag(MR59, 40, 4), std::make_pair(58, 1));
-    EXPECT_EQ(d.lag(MR59, 40, 8), std::make_pair(60, -1));
-    EXPECT_EQ(d.lag(MR59, 40, 15), std::make_pair(64, 0));
-    // MR475/MR515 code the third subframe relatively, higher modes absolutely
-    d.st->old_T0 = 60;
-    EXPECT_EQ(d.lag(MR515, 80, 8), std::make_pair(60, -1));
-    EXPECT_EQ(d.lag(MR59, 80, 8), std::make_pair(22, 0));
 }
 
 TEST(DecoderLag, BadFramesGrowOldLagUpToMaximum) {
@@ -133,35 +104,6 @@ TEST(DecoderGain, PitchHistoryIsClampedAndLimitedAfterBadFrame) {
     EXPECT_EQ(g, 7000);
 }
 
-TEST(DecoderGain, ConcealedPitchGainIsAttenuatedMedian) {
-    const int16_t hist[5] = {9000, 12000, 3000, 15000, 10000};  // median 10000
-    int16_t g;
-    vamrnbd_ec_gain_pitch(16384, 0, hist, &g);
-    EXPECT_EQ(g, 9999);  // times 32767/32768
-    vamrnbd_ec_gain_pitch(5000, 4, hist, &g);
-    EXPECT_EQ(g, (5000 * 9830) >> 15);  // last gain is smaller than the median
-    vamrnbd_ec_gain_pitch(16384, 6, hist, &g);
-    EXPECT_EQ(g, (10000 * 6553) >> 15);
-}
-
-TEST(DecoderGain, ConcealedCodeGainAgesPredictorWithFloor) {
-    Decoder d;
-    for (int i = 0; i < 5; ++i) d.st->gbuf[i] = static_cast<Word16>(100 * (i + 1));
-    d.st->past_gain_code = 250;
-    d.st->conceal_state = 6;
-    const Word16 hist122[4] = {-1000, -2000, -3000, -4000};  // mean -2500, floored
-    const Word16 hist[4] = {-8000, -8000, -8000, -8004};     // mean -8001
-    std::memcpy(d.st->past_qua_en_MR122, hist122, sizeof hist122);
-    std::memcpy(d.st->past_qua_en, hist, sizeof hist);
-    Word16 g;
-    ec_gain_code(d.st.get(), &g);
-    EXPECT_EQ(g, (250 * 22937) >> 15);
-    EXPECT_EQ(d.st->past_qua_en_MR122[0], -2381);
-    EXPECT_EQ(d.st->past_qua_en_MR122[1], -1000);
-    EXPECT_EQ(d.st->past_qua_en[0], -8001);
-    EXPECT_EQ(d.st->past_qua_en[3], -8000);
-}
-
 TEST(DecoderCodebook, PulseVectors) {
     Decoder d;
     d.w->T0 = 40;  // no pitch sharpening
@@ -191,19 +133,6 @@ TEST(DecoderCodebook, PulseVectors) {
     EXPECT_EQ(d.w->gain_pit, 0);
     EXPECT_EQ(nonzero(), (V{{1, 8192}, {2, 8192}, {3, 8192}, {4, 8192},
                             {5 * tab::dgray[1], -8192}}));
-}
-
-TEST(DecoderCodebook, PitchSharpeningAddsDelayedPulses) {
-    Decoder d;
-    d.w->T0 = 20;
-    d.st->sharp = 8192;  // factor 0.5 after doubling
-    int16_t p[2] = {0, 3};  // MR59: pulses at 1 and 0, both positive
-    const int16_t *c = p;
-    vamrnbd_icb(d.st.get(), d.w.get(), MR59, &c);
-    EXPECT_EQ(d.w->code[0], 8191);
-    EXPECT_EQ(d.w->code[1], 8191);
-    EXPECT_EQ(d.w->code[20], 4095);
-    EXPECT_EQ(d.w->code[21], 4095);
 }
 
 }  // namespace
