@@ -1,17 +1,14 @@
-// Encoder subframe stages: pitch-gain quantiser and limits, lag ranges and
-// lag coding, the track pairs of the low-rate codebooks, and the correlation
-// kernel's fast path at full scale.
+// Encoder subframe stages: pitch-gain quantiser and limits, lag search
+// ranges, the gain quantisers' pitch limit, and the correlation kernel's
+// fast path at full scale.
 
 #include <gtest/gtest.h>
 
 #include <cstdint>
 #include <memory>
 #include <random>
-#include <set>
 #include <vector>
 
-#include "basic_op/ext_op.h"
-#include "enc/cbsearch_lowrate.h"
 #include "enc/subframe.h"
 #include "lpc/tables.h"
 
@@ -25,21 +22,6 @@ std::vector<Word16> noise(std::mt19937 &rng, int n, int amp) {
     for (auto &x : v) x = static_cast<Word16>(d(rng));
     return v;
 }
-
-// A decaying impulse response in Q12 with a random fine structure; the
-// 40 samples before it are zero, as the stages expect.
-struct impulse {
-    Word16 buf[2 * L_SUBFR] = {};
-    Word16 *h = buf + L_SUBFR;
-    explicit impulse(std::mt19937 &rng) {
-        std::uniform_int_distribution<int> d(-600, 600);
-        int amp = 4096;
-        for (int i = 0; i < L_SUBFR; ++i) {
-            h[i] = static_cast<Word16>(i == 0 ? 4096 : amp / 2 + d(rng) * amp / 4096);
-            amp = amp * 7 / 8;
-        }
-    }
-};
 
 const int16_t *pitch_tbl = vamrnb_tbl_qua_gain_pitch;
 
@@ -148,7 +130,7 @@ TEST(PitchGainLimits, LowRateModesCapAt13926AndClipOnlyTheQuantiser) {
     EXPECT_EQ(gain, 13927);
 }
 
-// ---- lag search ranges and lag coding ---------------------------------------
+// ---- lag search ranges -------------------------------------------------------
 
 TEST(LagRange, StaysInsideLimitsWithFullWidth) {
     Word16 lo, hi;
@@ -172,91 +154,6 @@ TEST(LagRange, StaysInsideLimitsWithFullWidth) {
                 ASSERT_GE(lo, p[8]);
                 ASSERT_LE(hi, PIT_MAX);
             }
-        }
-    }
-}
-
-namespace {
-
-// Checks that the indices of (lag, fraction) pairs listed in increasing
-// order increase strictly and stay inside [0, max_index].
-void expect_increasing(const std::vector<std::pair<int, int>> &lags, int max_index,
-                       Word16 (*code)(Word16, Word16)) {
-    int prev = -1;
-    for (auto [T, f] : lags) {
-        const int idx = code(static_cast<Word16>(T), static_cast<Word16>(f));
-        ASSERT_GT(idx, prev) << "lag " << T << " frac " << f;
-        ASSERT_LE(idx, max_index) << "lag " << T << " frac " << f;
-        prev = idx;
-    }
-}
-
-}  // namespace
-
-TEST(LagCoding, AbsoluteIndicesAreOrderedAndFillTheirBits) {
-    std::vector<std::pair<int, int>> third;
-    for (int T = 19; T <= 85; ++T) {
-        for (int f = -1; f <= 1; ++f) {
-            if ((T == 19 && f < 1) || (T == 85 && f > 0)) continue;
-            third.push_back({T, f});
-        }
-    }
-    for (int T = 86; T <= 143; ++T) third.push_back({T, 0});
-    ASSERT_EQ(third.size(), 256u);
-    expect_increasing(third, 255, [](Word16 T, Word16 f) { return enc_lag3(T, f, 0, 0, 0, 0, 0); });
-
-    std::vector<std::pair<int, int>> sixth;
-    for (int T = 17; T <= 94; ++T) {
-        for (int f = -2; f <= 3; ++f) {
-            if (T == 17 && f < 3) continue;
-            sixth.push_back({T, f});
-        }
-    }
-    for (int T = 95; T <= 143; ++T) sixth.push_back({T, 0});
-    ASSERT_EQ(sixth.size(), 512u);
-    expect_increasing(sixth, 511, [](Word16 T, Word16 f) { return enc_lag6(T, f, 0, 0); });
-}
-
-// ---- algebraic codebooks -----------------------------------------------------
-
-namespace {
-
-// MR475/MR515 parameters back to the unsharpened code vector.
-void decode_9bit(int subfr, Word16 index, Word16 sign, Word16 *cod) {
-    const int pair = (index >> 6) & 1;
-    const int pos0 = (index & 7) * 5 + tab::startPos[pair * 8 + subfr * 2];
-    const int pos1 = ((index >> 3) & 7) * 5 + tab::startPos[pair * 8 + subfr * 2 + 1];
-    for (int i = 0; i < L_CODE; ++i) cod[i] = 0;
-    cod[pos0] = (sign & 1) ? 8191 : -8192;
-    cod[pos1] = (sign & 2) ? 8191 : -8192;
-}
-
-}  // namespace
-
-TEST(CodebookMr475Mr515, PulsesUseTheTracksOfEachSubframe) {
-    // The two track pairs (position mod 5) of each subframe.
-    const std::set<std::set<int>> pairs[4] = {
-        {{0, 2}, {1, 3}}, {{0, 3}, {2, 4}}, {{0, 2}, {1, 4}}, {{0, 3}, {1, 4}}};
-    std::mt19937 rng(475);
-    for (int32_t mode : {MR475, MR515}) {
-        for (int subfr = 0; subfr < 4; ++subfr) {
-            std::set<std::set<int>> seen;
-            for (int trial = 0; trial < 60; ++trial) {
-                impulse imp(rng);
-                const auto x = noise(rng, L_CODE, 3000);
-                Word16 code[L_CODE], y[L_CODE], sign, expect[L_CODE];
-                const Word16 index =
-                    code_lowrate(mode, subfr, x.data(), imp.h, 40, 9000, code, y, &sign);
-                decode_9bit(subfr, index, sign, expect);
-                std::set<int> residues;
-                for (int i = 0; i < L_CODE; ++i) {
-                    ASSERT_EQ(code[i], expect[i]) << "position " << i;
-                    if (code[i] != 0) residues.insert(i % 5);
-                }
-                ASSERT_EQ(residues.size(), 2u);
-                seen.insert(residues);
-            }
-            EXPECT_EQ(seen, pairs[subfr]) << "subframe " << subfr;
         }
     }
 }

@@ -1,4 +1,5 @@
-// LSF/LSP/LPC conversions and the LSF dequantisers' bad-frame concealment.
+// LSF spacing, LSF/LSP conversion and the LSF dequantisers' bad-frame
+// concealment.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -21,34 +22,6 @@ void random_lsf(std::mt19937 &rng, Word16 lsf[10]) {
     std::uniform_int_distribution<int> d(-500, 500);
     for (int i = 0; i < 10; ++i) lsf[i] = static_cast<Word16>((i + 1) * 1489 + d(rng));
     vamrnb_reorder(lsf);
-}
-
-// Direct-form predictor of an LSP set in double precision: the even and odd
-// LSPs give the product polynomials F1, F2; A = ((1+z^-1)F1 + (1-z^-1)F2)/2.
-void lsp_to_a_model(const Word16 lsp[10], double a[11]) {
-    double f[2][6];
-    for (int p = 0; p < 2; ++p) {
-        double *c = f[p];
-        c[0] = 1.0;
-        for (int k = 1; k < 6; ++k) c[k] = 0.0;
-        for (int k = 0; k < 5; ++k) {
-            const double q = lsp[2 * k + p] / 32768.0;
-            double n[6] = {0};
-            for (int j = 0; j < 6; ++j) {
-                n[j] += c[j];
-                if (j >= 1) n[j] += -2.0 * q * c[j - 1];
-                if (j >= 2) n[j] += c[j - 2];
-            }
-            std::memcpy(c, n, sizeof n);
-        }
-    }
-    a[0] = 1.0;
-    for (int i = 1; i <= 5; ++i) {
-        const double g1 = f[0][i] + f[0][i - 1];
-        const double g2 = f[1][i] - f[1][i - 1];
-        a[i] = (g1 + g2) / 2.0;
-        a[11 - i] = (g1 - g2) / 2.0;
-    }
 }
 
 }  // namespace
@@ -97,21 +70,6 @@ TEST(LsfLsp, EndpointsAndRoundTrip) {
             EXPECT_NEAR(p[i], 32768.0 * std::cos(kPi * f[i] / 16384.0), 24.0) << f[i];
             EXPECT_NEAR(back[i], f[i], 4) << "i=" << i;
         }
-    }
-}
-
-TEST(LspAz, MatchesDoublePrecisionExpansion) {
-    std::mt19937 rng(11);
-    for (int t = 0; t < 300; ++t) {
-        Word16 lsf[10], lsp[10], a[11];
-        random_lsf(rng, lsf);
-        vamrnb_sf_sp(lsf, vamrnb_tbl_cos_lsp_lsf, lsp);
-        std::fill(a, a + 11, Word16{0x5555});
-        EXPECT_EQ(vamrnb_lsp_az(lsp, a), 0);
-        EXPECT_EQ(a[0], 4096);
-        double m[11];
-        lsp_to_a_model(lsp, m);
-        for (int i = 1; i <= 10; ++i) EXPECT_NEAR(a[i], m[i] * 4096.0, 2.0) << "t=" << t << " i=" << i;
     }
 }
 
