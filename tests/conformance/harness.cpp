@@ -3,6 +3,8 @@
 // table and the parallel runner.
 #include "harness.h"
 
+#include "vamrnb.h"
+
 #include <algorithm>
 #include <atomic>
 #include <cstdio>
@@ -44,6 +46,13 @@ Roots find_roots() {
     r.corpus = base / "corpus";
     std::printf("conformance: %s vectors in %s\n", r.subset ? "bundled subset of the" : "full set of",
                 r.vectors.string().c_str());
+    // VAMRNB_CPU_FLAGS restricts the kernels to the listed vector features
+    // (0 = portable code only), so every level can be checked against the vectors.
+    if (const char *env = std::getenv("VAMRNB_CPU_FLAGS"); env != nullptr && *env != '\0') {
+        const auto mask = static_cast<uint32_t>(std::strtoul(env, nullptr, 0));
+        vamrnb_set_cpu_flags(mask);
+        std::printf("conformance: kernels restricted to CPU feature mask 0x%x\n", static_cast<unsigned>(mask));
+    }
     return r;
 }
 
