@@ -153,3 +153,11 @@ VAMRNB_API void vamrnbd_dtx(vamrnb::dec_state *st, vamrnb::dec_work *w, const in
 // Comfort-noise histories after a frame of decoded speech (dec_synth(w)).
 VAMRNB_API void vamrnbd_dtx_dec_activity_update(vamrnb::dec_state *st, vamrnb::dec_work *w);
 }
+
+namespace vamrnb {
+// Gain (Q12-scaled square root of the energy ratio) that brings a signal of
+// energy sig_energy (from vamrnbd_energy_new, not 0) to the energy of ref;
+// 0 when ref is silent.  Shared by the post-filter's and the excitation's
+// gain control.
+Word16 agc_gain(Word32 sig_energy, const Word16 *ref);
+}  // namespace vamrnb

@@ -191,21 +191,9 @@ void ex_ctrl(Word16 *exc, Word16 exc_energy, const Word16 hist[9], Word16 voiced
 
 // Scales the enhanced excitation to the energy of the unenhanced one.
 void agc2(const Word16 *ref, Word16 *sig) {
-    Word32 s = vamrnbd_energy_new(sig);
+    const Word32 s = vamrnbd_energy_new(sig);
     if (s == 0) return;
-    Word16 exp = sub(norm_l(s), 1);
-    const Word16 gain_out = round16(l_shl(s, exp));
-    Word16 g0 = 0;
-    s = vamrnbd_energy_new(ref);
-    if (s != 0) {
-        const Word16 i = norm_l(s);
-        const Word16 gain_in = round16(l_shl(s, i));
-        exp = sub(exp, i);
-        s = l_deposit_l(div_s(gain_out, gain_in));
-        s = l_shr(l_shl(s, 7), exp);
-        s = vamrnb_inv_sqrt(s);
-        g0 = round16(l_shl(s, 9));
-    }
+    const Word16 g0 = agc_gain(s, ref);
     for (int i = 0; i < L_SUBFR; ++i) sig[i] = scale_q12(sig[i], g0);
 }
 
@@ -220,6 +208,24 @@ extern "C" int32_t vamrnbd_energy_new(const int16_t in[40]) {
     if (s == MAX_32) return energy_scaled(in);
     return l_shr(s, 4);
 }
+
+namespace vamrnb {
+
+Word16 agc_gain(Word32 sig_energy, const Word16 *ref) {
+    Word16 exp = sub(norm_l(sig_energy), 1);
+    const Word16 gain_out = round16(l_shl(sig_energy, exp));
+    Word32 s = vamrnbd_energy_new(ref);
+    if (s == 0) return 0;
+    const Word16 i = norm_l(s);
+    const Word16 gain_in = round16(l_shl(s, i));
+    exp = sub(exp, i);
+    s = l_deposit_l(div_s(gain_out, gain_in));
+    s = l_shr(l_shl(s, 7), exp);
+    s = vamrnb_inv_sqrt(s);
+    return round16(l_shl(s, 9));
+}
+
+}  // namespace vamrnb
 
 extern "C" void vamrnbd_excit(dec_state *st, dec_work *w, int32_t i_subfr) {
     const int32_t mode = w->rx.frame_mode;

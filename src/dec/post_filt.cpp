@@ -40,19 +40,7 @@ void agc(post_filter_state *st, const Word16 *in, Word16 *out) {
         st->past_gain = 0;
         return;
     }
-    Word16 exp = sub(norm_l(s), 1);
-    const Word16 gain_out = round16(l_shl(s, exp));
-    Word16 g0 = 0;
-    s = vamrnbd_energy_new(in);
-    if (s != 0) {
-        const Word16 i = norm_l(s);
-        const Word16 gain_in = round16(l_shl(s, i));
-        exp = sub(exp, i);
-        s = l_deposit_l(div_s(gain_out, gain_in));
-        s = l_shr(l_shl(s, 7), exp);
-        s = vamrnb_inv_sqrt(s);
-        g0 = mult(round16(l_shl(s, 9)), sub(32767, AGC_FAC));
-    }
+    const Word16 g0 = mult(agc_gain(s, in), sub(32767, AGC_FAC));
     // smoothed gain per sample (never negative), then the scaling:
     // extract_h(l_shl(l_mult(x, g), 3)) is x g shifted down by 12, saturated
     Word16 gains[L_SUBFR];
