@@ -12,6 +12,16 @@
 #include <cstdint>
 #include <type_traits>
 
+// 32-bit ARM with the DSP extension has single-instruction saturating adds
+// (QADD, QSUB, QDADD) and a saturate-to-width (SSAT); the operators use them
+// at run time and fall back to the portable forms in constant evaluation.
+#if defined(__arm__) && defined(__ARM_FEATURE_DSP) && defined(__ARM_FEATURE_SAT)
+#include <arm_acle.h>
+#define VAMRNB_ARM_DSP 1
+#else
+#define VAMRNB_ARM_DSP 0
+#endif
+
 namespace vamrnb {
 
 using Word16 = int16_t;
@@ -43,15 +53,32 @@ constexpr Word16 wrap16(Word32 a) { return static_cast<Word16>(a); }
 constexpr Word16 sat16(int64_t v) {
     return v > MAX_16 ? MAX_16 : v < MIN_16 ? MIN_16 : static_cast<Word16>(v);
 }
+// Clamp of a value already known to fit 32 bits: the cheap common case.
+constexpr Word16 sat16_32(Word32 v) {
+#if VAMRNB_ARM_DSP
+    if (!std::is_constant_evaluated()) return static_cast<Word16>(__ssat(v, 16));
+#endif
+    return v > MAX_16 ? MAX_16 : v < MIN_16 ? MIN_16 : static_cast<Word16>(v);
+}
 constexpr Word32 sat32(int64_t v) {
     return v > MAX_32 ? MAX_32 : v < MIN_32 ? MIN_32 : static_cast<Word32>(v);
 }
 
 // ---- 16-bit operators ------------------------------------------------------
 
-constexpr Word16 saturate(Word32 L) { return sat16(L); }
-constexpr Word16 add(Word32 a, Word32 b) { return sat16(int64_t{a} + b); }
-constexpr Word16 sub(Word32 a, Word32 b) { return sat16(int64_t{a} - b); }
+constexpr Word16 saturate(Word32 L) { return sat16_32(L); }
+// A 32-bit overflow of a ± b can only happen far outside 16 bits, on the side
+// of a's sign; otherwise the 32-bit result is clamped.
+constexpr Word16 add(Word32 a, Word32 b) {
+    Word32 s = 0;
+    if (__builtin_add_overflow(a, b, &s)) return a < 0 ? MIN_16 : MAX_16;
+    return sat16_32(s);
+}
+constexpr Word16 sub(Word32 a, Word32 b) {
+    Word32 s = 0;
+    if (__builtin_sub_overflow(a, b, &s)) return a < 0 ? MIN_16 : MAX_16;
+    return sat16_32(s);
+}
 
 constexpr Word16 abs_s(Word16 a) {
     return a == MIN_16 ? MAX_16 : static_cast<Word16>(a < 0 ? -a : a);
@@ -76,11 +103,12 @@ constexpr Word16 shr(Word16 a, Word32 n) {
     return static_cast<Word16>(a >> n);
 }
 
+// |a·b| <= 2^30, so the products and the rounding term stay inside 32 bits.
 constexpr Word16 mult(Word16 a, Word16 b) {
-    return sat16((Word32{a} * b) >> 15);
+    return sat16_32((Word32{a} * b) >> 15);
 }
 constexpr Word16 mult_r(Word16 a, Word16 b) {
-    return sat16((Word32{a} * b + 0x4000) >> 15);
+    return sat16_32((Word32{a} * b + 0x4000) >> 15);
 }
 
 constexpr Word16 extract_h(Word32 L) { return static_cast<Word16>(L >> 16); }
@@ -89,11 +117,30 @@ constexpr Word16 extract_l(Word32 L) { return wrap16(L); }
 // ---- 32-bit operators ------------------------------------------------------
 
 constexpr Word32 l_mult(Word16 a, Word16 b) {
+#if VAMRNB_ARM_DSP
+    if (!std::is_constant_evaluated()) return __qdbl(Word32{a} * b);
+#endif
     const Word32 p = Word32{a} * b;
     return p == 0x40000000 ? MAX_32 : p * 2;
 }
-constexpr Word32 l_add(Word32 a, Word32 b) { return sat32(int64_t{a} + b); }
-constexpr Word32 l_sub(Word32 a, Word32 b) { return sat32(int64_t{a} - b); }
+// On overflow the true sum lies beyond the limit on the side of a's sign:
+// (a >> 31) ^ MAX_32 is MAX_32 for a >= 0 and MIN_32 for a < 0.
+constexpr Word32 l_add(Word32 a, Word32 b) {
+#if VAMRNB_ARM_DSP
+    if (!std::is_constant_evaluated()) return __qadd(a, b);
+#endif
+    Word32 s = 0;
+    if (__builtin_add_overflow(a, b, &s)) return (a >> 31) ^ MAX_32;
+    return s;
+}
+constexpr Word32 l_sub(Word32 a, Word32 b) {
+#if VAMRNB_ARM_DSP
+    if (!std::is_constant_evaluated()) return __qsub(a, b);
+#endif
+    Word32 s = 0;
+    if (__builtin_sub_overflow(a, b, &s)) return (a >> 31) ^ MAX_32;
+    return s;
+}
 constexpr Word32 l_mac(Word32 acc, Word16 a, Word16 b) { return l_add(acc, l_mult(a, b)); }
 constexpr Word32 l_msu(Word32 acc, Word16 a, Word16 b) { return l_sub(acc, l_mult(a, b)); }
 constexpr Word32 l_negate(Word32 L) { return L == MIN_32 ? MAX_32 : -L; }
@@ -111,10 +158,13 @@ constexpr Word32 l_shl(Word32 L, Word32 n) {
         const Word32 s = -static_cast<int64_t>(n) > 31 ? 31 : -n;
         return L >> s;
     }
-    // Zero stays zero; any other value saturates after at most 31 doublings.
-    if (L == 0) return 0;
-    if (n > 30) return L > 0 ? MAX_32 : MIN_32;
-    return sat32(static_cast<int64_t>(L) * (int64_t{1} << n));
+    // L·2^n fits exactly when MIN_32 >> n <= L <= MAX_32 >> n; beyond 31
+    // doublings every non-zero value has saturated, so n = 31 stands for
+    // all larger counts (it still takes -1 exactly to MIN_32).
+    if (n > 31) n = 31;
+    if (L > (MAX_32 >> n)) return MAX_32;
+    if (L < (MIN_32 >> n)) return MIN_32;
+    return wrap_shl(L, n);
 }
 
 constexpr Word32 l_shr(Word32 L, Word32 n) {
@@ -139,14 +189,15 @@ constexpr Word32 l_shr_r(Word32 L, Word32 n) {
 constexpr Word16 norm_s(Word16 a) {
     if (a == 0) return 0;
     if (a == -1) return 15;
-    const auto v = static_cast<uint16_t>(a < 0 ? ~a : a);
-    return static_cast<Word16>(std::countl_zero(v) - 1);
+    // Leading sign bits beyond the first, counted in 32 bits less 16.
+    const uint32_t v = static_cast<uint32_t>(a < 0 ? ~Word32{a} : Word32{a});
+    return static_cast<Word16>(std::countl_zero(v) - 17);
 }
 
 constexpr Word16 norm_l(Word32 L) {
     if (L == 0) return 0;
     if (L == -1) return 31;
-    const auto v = static_cast<uint32_t>(L < 0 ? ~L : L);
+    const uint32_t v = static_cast<uint32_t>(L < 0 ? ~L : L);
     return static_cast<Word16>(std::countl_zero(v) - 1);
 }
 
