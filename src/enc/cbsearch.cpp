@@ -13,6 +13,8 @@
 
 #include "basic_op/ext_op.h"
 #include "enc/cbsearch_lowrate.h"
+#include "lpc/dsp.h"
+#include "lpc/enc_kernels.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
@@ -163,15 +165,57 @@ void sharpen(Word16 *v, Word16 T0, Word16 fac) {
 
 }  // namespace
 
+namespace {
+
+// Signed correlation matrix of h2 when no sum can saturate (see
+// vamrnbe_cor_h_sign).  Row j = L_CODE-1-k holds, at column i <= j, the sum
+// of 2·h2[m]·h2[m+j-i] over m <= k.  The running sum of lag d sits in
+// acc[L_CODE-1-d], so row j reads acc[k + i] for i = 0..j: each row is one
+// forward pass over contiguous arrays; the upper triangle is mirrored after.  Products |h2·h2| stay below 2^30 (a -32768 would
+// break the energy bound), and mult of two 16-bit values is never below
+// -32767, so the product of the rounded sum and the sign product is exact.
+void cor_h_sign_plain(const Word16 *h2, const Word16 *sign, Word16 *rr) {
+    Word16 h2_rev[L_CODE];
+    for (int m = 0; m < L_CODE; ++m) h2_rev[m] = h2[L_CODE - 1 - m];
+    Word32 acc[L_CODE] = {};
+    for (int k = 0; k < L_CODE; ++k) {
+        const int j = L_CODE - 1 - k;
+        const Word32 hk2 = 2 * h2[k];
+        const Word16 sj = sign[j];
+        Word32 *a = acc + k;
+        Word16 *rr_row = rr + j * L_CODE;
+        for (int i = 0; i < j; ++i) {
+            a[i] += hk2 * h2_rev[i];
+            const Word32 r = (a[i] + 0x8000) >> 16;
+            rr_row[i] = static_cast<Word16>((r * mult(sign[i], sj)) >> 15);
+        }
+        a[j] += hk2 * h2_rev[j];
+        rr_row[j] = static_cast<Word16>((a[j] + 0x8000) >> 16);
+    }
+    for (int i = 0; i < L_CODE; ++i)
+        for (int j = i + 1; j < L_CODE; ++j) rr[i * L_CODE + j] = rr[j * L_CODE + i];
+}
+
+}  // namespace
+
 void cor_h_x2(const Word16 *h, const Word16 *x, Word16 *dn, Word16 sf, Word16 nb_track,
               Word16 step) {
     Word32 y32[L_CODE];
+    // With energies that rule out saturation the correlations are plain
+    // integer sums (order free, so the compiler may vectorise them).
+    const bool plain = enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_CODE),
+                                                 enc_kernel::sum_sq(h, L_CODE));
     Word32 tot = 5;
     for (int k = 0; k < nb_track; ++k) {
         Word32 max = 0;
         for (int i = k; i < L_CODE; i += step) {
             Word32 s = 0;
-            for (int j = i; j < L_CODE; ++j) s = l_mac(s, x[j], h[j - i]);
+            if (plain) {
+                for (int j = i; j < L_CODE; ++j) s += int32_t{x[j]} * h[j - i];
+                s *= 2;
+            } else {
+                for (int j = i; j < L_CODE; ++j) s = l_mac(s, x[j], h[j - i]);
+            }
             y32[i] = s;
             s = l_abs(s);
             if (s > max) max = s;
@@ -343,21 +387,30 @@ using namespace vamrnb;
 extern "C" {
 
 void vamrnbe_cor_h_x(const int16_t *h, const int16_t *x, int16_t *dn, int32_t sf) {
+    // A vector version with identical results takes over where available.
+    if (const CorHxFn vec = dsp().cor_h_x) {
+        vec(h, x, dn, sf);
+        return;
+    }
     cor_h_x2(h, x, dn, static_cast<Word16>(sf), 5, 5);
 }
 
 void vamrnbe_cor_h_sign(const int16_t *h2, const int16_t *sign, int16_t *rr) {
-    // When twice the energy of h2 stays below the 32-bit maximum, no running
-    // sum below (diagonal or, by Cauchy-Schwarz, off-diagonal) can saturate,
-    // and plain integer sums give the saturating results.
+    // Every running sum below is bounded by twice the energy of h2 (diagonal,
+    // or by Cauchy-Schwarz off-diagonal).  When that bound plus the rounding
+    // term stays below the 32-bit maximum, nothing saturates and the matrix
+    // is built row by row in plain integers.
     int64_t energy = 0;
     for (int k = 0; k < L_CODE; ++k) energy += int32_t{h2[k]} * h2[k];
-    const bool exact = 2 * energy <= MAX_32;
+    if (2 * energy <= MAX_32 - 0x8000) {
+        cor_h_sign_plain(h2, sign, rr);
+        return;
+    }
 
     // Diagonal: energies of the tails of h2, without signs.
     Word32 s = 0;
     for (int k = 0, i = L_CODE - 1; k < L_CODE; ++k, --i) {
-        s = exact ? s + 2 * (int32_t{h2[k]} * h2[k]) : l_mac(s, h2[k], h2[k]);
+        s = l_mac(s, h2[k], h2[k]);
         rr[i * L_CODE + i] = round16(s);
     }
     // Off-diagonals, built from the end of the subframe backwards.
@@ -366,7 +419,7 @@ void vamrnbe_cor_h_sign(const int16_t *h2, const int16_t *sign, int16_t *rr) {
         int j = L_CODE - 1;
         int i = j - dec;
         for (int k = 0; k < L_CODE - dec; ++k, --i, --j) {
-            s = exact ? s + 2 * (int32_t{h2[k]} * h2[k + dec]) : l_mac(s, h2[k], h2[k + dec]);
+            s = l_mac(s, h2[k], h2[k + dec]);
             const Word16 v = mult(round16(s), mult(sign[i], sign[j]));
             rr[j * L_CODE + i] = v;
             rr[i * L_CODE + j] = v;
