@@ -11,6 +11,8 @@
 
 #include "enc/subframe.h"
 
+#include <utility>
+
 #include "basic_op/ext_op.h"
 #include "lpc/dsp.h"
 #include "lpc/enc_kernels.h"
@@ -356,7 +358,8 @@ void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y) {
 
 void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t *h,
                             int32_t t_min, int32_t t_max, int16_t *corr) {
-    Word16 excf[L_SUBFR];
+    Word16 buf_a[L_SUBFR], buf_b[L_SUBFR];
+    Word16 *excf = buf_a, *next = buf_b;
     vamrnbe_convolve(exc - t_min, h, excf);
 
     // Work on excf/4 when its energy is large, to keep the sums in range.
@@ -367,6 +370,13 @@ void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t
         h_fac = 15 - 12 - 2;
         scaling = 2;
     }
+
+    // extract_h(l_shl(l_mult(e, h), h_fac)) with s = h_fac + 1 doublings in
+    // all: e·h (exact, |e·h| <= 2^30) saturates after them exactly when it
+    // leaves [MIN_32 >> s, MAX_32 >> s], and the high half of the clamped
+    // value is then (e·h) >> (16 - s).
+    const int s = h_fac + 1;
+    const Word32 lo = MIN_32 >> s, hi = MAX_32 >> s;
 
     const int64_t xn_sq = sum_squares(xn);
     int k = -t_min;
@@ -382,10 +392,14 @@ void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t
             // Filtered excitation of the next lag: shift by one sample and add
             // the contribution of the newly included excitation sample.
             --k;
-            for (int j = L_SUBFR - 1; j > 0; --j) {
-                excf[j] = add(extract_h(l_shl(l_mult(exc[k], h[j]), h_fac)), excf[j - 1]);
+            const Word32 e = exc[k];
+            for (int j = 1; j < L_SUBFR; ++j) {
+                Word32 p = e * h[j];
+                p = p < lo ? lo : p > hi ? hi : p;
+                next[j] = sat16_32((p >> (16 - s)) + excf[j - 1]);
             }
-            excf[0] = shr(exc[k], scaling);
+            next[0] = shr(exc[k], scaling);
+            std::swap(excf, next);
         }
     }
 }
