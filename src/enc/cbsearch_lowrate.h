@@ -8,9 +8,10 @@ namespace vamrnb {
 // The candidate (sq, alp) beats the best so far (sqk, alpk) when
 // sq/alp > sqk/alpk.  The fixed-point criterion alpk*sq - sqk*alp > 0 only
 // saturates towards its own sign, so an exact product comparison decides
-// the same way.
+// the same way; each product of two 16-bit values is at most 2^30 in size,
+// so both products and their comparison fit 32 bits.
 inline bool better(Word16 sq, Word16 alp, Word16 sqk, Word16 alpk) {
-    return int64_t{alpk} * sq > int64_t{sqk} * alp;
+    return Word32{alpk} * sq > Word32{sqk} * alp;
 }
 
 // Filtered code vector: y[i] = round(sum_k h[i - codvec[k]] * signs[k]);

@@ -310,6 +310,8 @@ Word16 mr475_gain_quant(subfr_state &ss, const Word16 *sf1_code, Word16 sf1_exp_
     const int16_t *tbl = vamrnb_tb1_gain_mr475;
     for (int i = 0; i < VQ_ROWS_MR475; ++i) {
         const int16_t *row = tbl + 4 * i;
+        // Rows whose pitch gain exceeds the limit in either subframe are out.
+        if (row[0] > gp_limit || row[2] > gp_limit) continue;
         Word16 g_pitch = row[0];
         Word16 g_code = mult(row[1], sf0_gcode0);
         Word16 g2_pitch = mult(g_pitch, g_pitch);
@@ -320,10 +322,8 @@ Word16 mr475_gain_quant(subfr_state &ss, const Word16 *sf1_code, Word16 sf1_exp_
         L = mac_32_16(L, coeff[2], coeff_lo[2], g2_code);
         L = mac_32_16(L, coeff[3], coeff_lo[3], g_code);
         L = mac_32_16(L, coeff[4], coeff_lo[4], g_pit_cod);
-        const bool sf0_ok = g_pitch <= gp_limit;
 
         g_pitch = row[2];
-        if (!sf0_ok || g_pitch > gp_limit) continue;
         g_code = mult(row[3], sf1_gcode0);
         g2_pitch = mult(g_pitch, g_pitch);
         g2_code = mult(g_code, g_code);
