@@ -5,15 +5,15 @@
 
 extern "C" {
 // Pitch gain of a separately coded mode (Q14).
-int16_t vamrnbd_d_gain_pitch(int32_t mode, int16_t index);
+VAMRNB_API int16_t vamrnbd_d_gain_pitch(int32_t mode, int16_t index);
 // Concealed pitch gain: min(median of the history, last gain), attenuated
 // according to the concealment state.
-void vamrnbd_ec_gain_pitch(int16_t past_gain_pit, int16_t state, const int16_t pbuf[5],
-                           int16_t *gain_pitch);
+VAMRNB_API void vamrnbd_ec_gain_pitch(int16_t past_gain_pit, int16_t state, const int16_t pbuf[5],
+                                      int16_t *gain_pitch);
 // Limits a good frame's pitch gain after a bad frame and pushes it into the
 // concealment history.
-void vamrnbd_ec_gain_pitch_update(vamrnb::dec_state *st, int16_t bfi, int16_t prev_bf,
-                                  int16_t *gain_pitch);
+VAMRNB_API void vamrnbd_ec_gain_pitch_update(vamrnb::dec_state *st, int16_t bfi, int16_t prev_bf,
+                                             int16_t *gain_pitch);
 }
 
 namespace vamrnb {

@@ -5,6 +5,7 @@
 #pragma once
 
 #include "basic_op/basic_op.h"
+#include "vamrnb.h"
 #include "dec/cn_state.h"
 
 namespace vamrnb {
@@ -53,6 +54,6 @@ void a_refl(const Word16 a[10], Word16 refl[10]);
 extern "C" {
 void    vamrnbd_dtx(vamrnb::dec_state *st, vamrnb::dec_work *w, const int16_t **cursor);
 void    vamrnbd_dtx_dec_activity_update(vamrnb::dec_state *st, vamrnb::dec_work *w);
-int16_t vamrnbd_pseudonoise(int32_t n, int32_t *seed);
-void    vamrnbd_build_cn_code(int32_t *seed, int16_t cod[40]);
+VAMRNB_API int16_t vamrnbd_pseudonoise(int32_t n, int32_t *seed);
+VAMRNB_API void    vamrnbd_build_cn_code(int32_t *seed, int16_t cod[40]);
 }
