@@ -57,6 +57,16 @@ IF2 = {
 }
 
 
+# Frame types 9 to 11 (the other systems' comfort-noise frames) have sizes in
+# the storage format although this codec reads none of their bits; the table
+# files leave them 0, which would stall a reader that walks a stream by size.
+STORAGE_SIZES = {
+    "unpacked_size": {9: 43, 10: 38, 11: 37},
+    "bitno_packed_size": {9: 7, 10: 6, 11: 6},
+    "unused_size": {9: 5},
+}
+
+
 def read_table(path):
     head, vals = {}, []
     with open(path) as f:
@@ -95,6 +105,8 @@ def main():
         t = ctype(head)
         n = len(vals)
         note = f"// {head.get('name', s)}: {head.get('shape', n)} — {head.get('used for', '')}"
+        for ft, v in STORAGE_SIZES.get(s, {}).items():
+            vals[ft] = v
         if s in ("prmno", "prmnofsf"):
             vals = vals + [0]
             n += 1

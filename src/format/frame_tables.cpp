@@ -275,7 +275,7 @@ extern "C" {
 
 // packed_size: 16 — storage format: frame size in bytes incl. TOC byte per frame type 0..15; compiled only with MMS_IO
 const int16_t vamrnb_tbl_packed_size[16] = {
-    13, 14, 16, 18, 20, 21, 27, 32, 6, 0, 0, 0,
+    13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6,
     0, 0, 0, 1,
 };
 
@@ -297,13 +297,13 @@ const uint8_t vamrnb_tbl_toc_byte[16] = {
 
 // unpacked_size: 16 — storage format: number of class (speech or SID) bits per frame type 0..15; compiled only with MMS_IO
 const int16_t vamrnb_tbl_unpacked_size[16] = {
-    95, 103, 118, 134, 148, 159, 204, 244, 35, 0, 0, 0,
+    95, 103, 118, 134, 148, 159, 204, 244, 35, 43, 38, 37,
     0, 0, 0, 0,
 };
 
 // unused_size: 16 — storage format: zero padding bits in the last byte per frame type 0..15; compiled only with MMS_IO
 const int16_t vamrnb_tbl_unused_size[16] = {
-    1, 1, 2, 2, 4, 1, 4, 4, 1, 0, 0, 0,
+    1, 1, 2, 2, 4, 1, 4, 4, 1, 5, 0, 0,
     0, 0, 0, 0,
 };
 
