@@ -63,6 +63,7 @@ typedef struct vamrnb_stream_frame {
     /** The two padding bits of the table-of-contents byte as found; 0 in a
      *  well-formed stream.  The decoder ignores them. */
     uint8_t padding;
+    /** Always 0. */
     uint8_t reserved;
     /** Byte offset of the table-of-contents byte from the start of the stream. */
     uint64_t offset;
