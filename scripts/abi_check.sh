@@ -22,7 +22,7 @@ baseline=abi/vamrnb.abi
 for tool in abidw abidiff readelf; do
     command -v "$tool" >/dev/null || { echo "abi_check: $tool not found (Debian: abigail-tools, binutils)" >&2; exit 2; }
 done
-if ! readelf -S "$lib" | grep -q '\.debug_info'; then
+if ! readelf -S "$lib" | grep '\.debug_info' >/dev/null; then  # grep -q would cut readelf off (pipefail)
     echo "abi_check: $lib has no debug information; build it with -DCMAKE_BUILD_TYPE=RelWithDebInfo" >&2
     exit 2
 fi
@@ -32,6 +32,8 @@ trap 'rm -rf "$work"' EXIT
 
 # Names declared in the public headers: functions and exported tables.
 functions=$(sed -n 's/^VAMRNB_API[^(;]*[ *]\([A-Za-z_][A-Za-z0-9_]*\) *(.*/\1/p' include/*.h | sort -u | paste -sd'|')
+# Opaque handles: structs the headers only name (typedef struct x x;).
+handles=$(sed -n 's/^typedef struct \([A-Za-z_][A-Za-z0-9_]*\) \1;.*/\1/p' include/*.h | sort -u | paste -sd'|')
 variables=$(sed -n 's/^VAMRNB_API extern .*[ *]\([A-Za-z_][A-Za-z0-9_]*\)\(\[[0-9]*\]\)* *;.*/\1/p' include/*.h | sort -u | paste -sd'|')
 cat >"$work/public.suppr" <<SUPPR
 [suppress_function]
@@ -42,10 +44,14 @@ cat >"$work/public.suppr" <<SUPPR
   drop = yes
 [suppress_type]
   source_location_not_regexp = .*/include/vamrnb[a-z_]*\\.h
+  name_not_regexp = ^($handles)\$
   drop = yes
 SUPPR
 
-# Every type the public headers define, reachable or not (enums included).
+# Every type the public headers define, reachable or not (enums included);
+# all other types are dropped, except the opaque handles, which
+# --drop-private-types keeps as declarations (dropping them would drop the
+# parameters that point to them).
 abidw --headers-dir include --drop-private-types --load-all-types \
       --suppressions "$work/public.suppr" --no-show-locs --no-corpus-path \
       --no-comp-dir-path "$lib" >"$work/current.abi"
