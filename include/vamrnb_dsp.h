@@ -303,7 +303,7 @@ VAMRNB_API void    vamrnb_log2_norm(int32_t L_x, int16_t exp, int16_t *exponent,
 VAMRNB_API void    vamrnb_log2(int32_t L_x, int16_t *exponent, int16_t *fraction);
 /**
  * Power of two of a fractional exponent.
- * @param exponent integer part (0..30).
+ * @param exponent integer part, -1..30 (other values give 0).
  * @param fraction fractional part, Q15 (0..32767).
  * @return 2^(exponent + fraction / 32768), as a Word32.
  */
@@ -316,10 +316,11 @@ VAMRNB_API int32_t vamrnb_pow2(int16_t exponent, int16_t fraction);
  */
 VAMRNB_API int32_t vamrnb_inv_sqrt(int32_t L_x);
 /**
- * Inverse square root of a value in normalised form, in place.
- * @param frac in: the normalised mantissa (Word32); out: the result's mantissa; must
- *   not be null.
- * @param exp in: the exponent; out: the result's exponent; must not be null.
+ * Square root in normalised form, in place: the input is normalised by an
+ * even left shift, and on return sqrt(input) = frac >> (exp / 2).
+ * @param frac in: a positive Word32 (0 or less gives 0 and 0); out: the root's
+ *   mantissa; must not be null.
+ * @param exp receives the even normalising shift; must not be null.
  */
 VAMRNB_API void    vamrnb_isqrt_n(int32_t *frac, int16_t *exp);
 /**
@@ -548,8 +549,9 @@ struct sid_sync_state;
  * @param reader a reader set on the frame; must not be null.
  * @param cls receives the quality bit, frame type or mode, and reception type
  *   (#vamrnb_rx_type); must not be null.
- * @param mode receives the mode of a speech frame or the mode indication of a SID
- *   frame; left alone for other frames; must not be null.
+ * @param mode receives the mode of a speech frame; for a SID frame the three
+ *   mode-indication bits in the order read, the first in bit 2 (@p cls gets the
+ *   codec mode they stand for); left alone for other frames; must not be null.
  * @param serial the per-bit vector, 250 entries, cleared by the caller; bits missing
  *   from a short frame read as 1.
  */
