@@ -87,7 +87,7 @@ extern "C" {
  *  values leave the library. */
 enum {
     AMRNB_OK                 = 0,  /**< Success. */
-    AMRNB_ERR_NO_MEMORY      = -2, /**< A create function could not allocate its instance. */
+    AMRNB_ERR_NO_MEMORY      = -2, /**< A create function could not allocate its memory. */
     AMRNB_ERR_UNSUPPORTED    = -3, /**< A create function was given a non-zero reserved
                                         configuration word or (encoder) a mode outside
                                         0..7; or vamrnbd_decode() was asked for a sample
@@ -213,8 +213,10 @@ typedef struct pcm_buffer {
                                     channels x 160 x bits_per_sample / 8 bytes (at most 960);
                                     one buffer per channel: data[1] and, with two channels,
                                     data[2], each room for 160 x bits_per_sample / 8 bytes.
-                                    Encoder: data[0], 160 int16_t samples, of which only the
-                                    13 most significant bits count. */
+                                    The decoder cannot see how large the buffers are: they
+                                    must have that room.  Encoder: data[0], 160 int16_t
+                                    samples, of which only the 13 most significant bits
+                                    count. */
     uint32_t channels;         /**< Word 32, set by the decoder: channels written, 1 or 2. */
     uint32_t bits_per_sample;  /**< Word 33, set by the decoder: 16, 8 or 24. */
     uint32_t reserved;         /**< Word 34: not used. */
