@@ -32,8 +32,10 @@
  *
  * @par Null pointers
  * Pointer arguments must not be null unless the function's documentation
- * says otherwise (the error-out pointer of the create functions, the
- * argument of vamrnb_platform_init() and vamrnbd_delete() may be null).
+ * says otherwise: the error-out pointer of the create functions and the
+ * arguments of vamrnb_platform_init(), vamrnbd_delete(), vamrnbe_delete()
+ * and vcmn_mfree_align32() may be null, and the functions of
+ * vamrnb_stream.h answer a null pointer with a status of their own.
  * A build with debug checks (CMake option VAMRNB_DEBUG_CHECKS, or any build
  * without NDEBUG) stops with a message naming the function and the argument
  * when a forbidden null pointer arrives; an ordinary release build does not
