@@ -307,8 +307,10 @@ VAMRNB_API void    vamrnbd_reset(vamrnb_decoder *dec);
  * (Q bit 0 marks it bad and it is concealed), 8 SID (comfort noise), 9 and
  * 12 to 15 no data (the decoder conceals a lost frame or continues comfort
  * noise, and still produces 160 samples), 10 and 11 refused.  Pass a lost
- * frame as the single byte 0x7C (frame type 15).  A decoder homing frame is
- * answered as the standard prescribes and resets the decoder.
+ * frame as the single byte 0x7C (frame type 15).  A decoder homing frame
+ * resets the decoder after its output; one that follows creation or another
+ * homing frame is answered with the homing pattern (every 16-bit sample
+ * 0x0008) instead of being decoded.
  *
  * @param dec  the decoder; must not be null.
  * @param in   the frame: in->data points at its table-of-contents byte,
