@@ -5,11 +5,8 @@
 // frames go through the decoder's concealment like any other frame.
 #include <sndfile.h>
 #include <soxr.h>
-#include <fcntl.h>
-#include <unistd.h>
 
 #include <algorithm>
-#include <cerrno>
 #include <chrono>
 #include <cstring>
 #include <memory>
@@ -165,9 +162,6 @@ private:
     std::vector<float> fin_, fout_;
 };
 
-struct ReaderCloser {
-    void operator()(vamrnb_stream_reader *r) const { vamrnb_stream_reader_delete(r); }
-};
 struct DecoderCloser {
     void operator()(vamrnb_decoder *d) const { vamrnbd_delete(d); }
 };
@@ -202,26 +196,13 @@ Outcome decode_file(const Options &o, const std::string &in, const std::string &
         return {EXIT_USAGE};
     }
 
-    const int fd = in == "-" ? 0 : ::open(in.c_str(), O_RDONLY);
-    if (fd < 0) {
-        message(name, std::strerror(errno));
-        return {EXIT_INPUT};
-    }
-    struct FdCloser {
-        int fd;
-        ~FdCloser() {
-            if (fd > 0) ::close(fd);
-        }
-    } fd_closer{fd};
-
-    std::unique_ptr<vamrnb_stream_reader, ReaderCloser> reader(vamrnb_stream_reader_create(nullptr));
     codec_config cfg{};
     cfg.dec.layout = 1;
     cfg.dec.channels = o.channels;
     cfg.dec.sample_format = o.bits == 8 ? 1 : o.bits == 24 ? 3 : 0;
     int32_t status = 0;
     std::unique_ptr<vamrnb_decoder, DecoderCloser> dec(vamrnbd_create(&cfg, &status));
-    if (!reader || !dec) {
+    if (!dec) {
         message(name, std::string("cannot create decoder: ") + vamrnb_strerror(status));
         return {EXIT_CODEC};
     }
@@ -237,9 +218,6 @@ Outcome decode_file(const Options &o, const std::string &in, const std::string &
     std::vector<int32_t> pcm(kBlock / kFrame * kFrame * ch);
     size_t pcm_frames = 0;  // sample frames waiting in pcm
     uint64_t frames = 0, substituted = 0, padded = 0, first_padding = 0;
-    uint8_t head[16];
-    size_t head_size = 0;
-    std::vector<uint8_t> buf(65536);
 
     auto flush = [&]() {
         if (pcm_frames && !sink.write(pcm.data(), pcm_frames, err)) return false;
@@ -282,53 +260,30 @@ Outcome decode_file(const Options &o, const std::string &in, const std::string &
         return EXIT_OK;
     };
 
-    int32_t st = AMRNB_OK;
-    uint64_t total_in = 0;
-    unsigned bad_byte = 0;
-    for (;;) {
-        ssize_t n = ::read(fd, buf.data(), buf.size());
-        if (n < 0 && errno == EINTR) continue;
-        if (n < 0) {
-            message(name, std::strerror(errno));
-            return {EXIT_INPUT};
-        }
-        if (n == 0) break;
-        const size_t got = static_cast<size_t>(n);
-        const size_t h = std::min(sizeof head - head_size, got);
-        std::memcpy(head + head_size, buf.data(), h);
-        head_size += h;
-        total_in += got;
-        for (size_t off = 0; off < got;) {
-            size_t used = 0;
-            vamrnb_stream_frame f{};
-            st = vamrnb_stream_read(reader.get(), buf.data() + off, got - off, &used, &f);
-            off += used;
-            if (st == VAMRNB_STREAM_ERR_TOC) bad_byte = buf[off];  // the reader stops on it
-            if (st < 0) break;
-            if (st != VAMRNB_STREAM_FRAME) continue;
+    StreamScan scan;
+    const int rc = scan_stream(
+        in,
+        [&](const vamrnb_stream_frame &f) {
             if (!opened) {
                 // The output is created only once the input is known to be AMR-NB.
                 if (!file.open(err) || !sink.open(o, file, fmt, err)) {
                     message(shown(out, true), "cannot create: " + err);
-                    return {EXIT_OUTPUT};
+                    return int{EXIT_OUTPUT};
                 }
                 opened = true;
             }
-            const int rc = decode(f);
-            if (rc == EXIT_OUTPUT) {
-                message(shown(out, true), "cannot write: " + err);
-                return {rc};
-            }
-            if (rc != EXIT_OK) return {rc};
-        }
-        if (st < 0) break;
-        progress.update(total_in, static_cast<double>(frames) * 0.02);
-    }
+            const int code = decode(f);
+            if (code == EXIT_OUTPUT) message(shown(out, true), "cannot write: " + err);
+            return code;
+        },
+        [&](uint64_t bytes) { progress.update(bytes, static_cast<double>(frames) * 0.02); }, scan);
     progress.finish();
-
-    vamrnb_stream_frame partial{};
-    if (st >= 0) st = vamrnb_stream_finish(reader.get(), &partial);
-    const unsigned long long at = vamrnb_stream_reader_offset(reader.get());
+    if (rc != EXIT_OK) {
+        if (!scan.read_error.empty()) message(name, scan.read_error);
+        return {rc};
+    }
+    const int32_t st = scan.status;
+    const vamrnb_stream_frame &partial = scan.partial;
     switch (st) {
     case AMRNB_OK:
         break;
@@ -347,10 +302,10 @@ Outcome decode_file(const Options &o, const std::string &in, const std::string &
     case VAMRNB_STREAM_ERR_TOC:
         message(name, format("invalid frame header byte 0x%02X at byte %llu (F bit set): not AMR-NB "
                              "storage format from there on",
-                             bad_byte, at));
+                             scan.bad_byte, static_cast<unsigned long long>(scan.offset)));
         return {EXIT_INPUT};
     default:
-        message(name, total_in == 0 ? "empty file" : explain_foreign(head, head_size, st));
+        message(name, scan.bytes == 0 ? "empty file" : explain_foreign(scan.head, scan.head_size, st));
         return {EXIT_INPUT};
     }
     if (padded)

@@ -1,13 +1,8 @@
 // info: what a storage-format file holds (frames by type and mode, duration,
 // codec and file bit rates, damage with its offsets), as text or one JSON
 // object per file; and one sentence for files that are something else.
-#include <fcntl.h>
-#include <unistd.h>
-
 #include <algorithm>
-#include <cerrno>
 #include <cstring>
-#include <memory>
 #include <mutex>
 
 #include "tool.h"
@@ -62,62 +57,34 @@ std::string explain_foreign(const uint8_t *head, size_t size, int32_t status) {
 
 Outcome info_file(const Options &o, const std::string &in) {
     const std::string name = shown(in);
-    const int fd = in == "-" ? 0 : ::open(in.c_str(), O_RDONLY);
-    if (fd < 0) {
-        message(name, std::strerror(errno));
-        return {EXIT_INPUT};
-    }
-    std::unique_ptr<vamrnb_stream_reader, void (*)(vamrnb_stream_reader *)> reader(
-        vamrnb_stream_reader_create(nullptr), vamrnb_stream_reader_delete);
-
-    uint64_t by_type[16] = {}, bad = 0, padded = 0, first_padding = 0, total = 0, frames = 0;
-    uint8_t head[16];
-    size_t head_size = 0;
-    unsigned bad_byte = 0;
-    int32_t st = AMRNB_OK;
-    uint8_t buf[65536];
-    for (;;) {
-        const ssize_t n = ::read(fd, buf, sizeof buf);
-        if (n < 0 && errno == EINTR) continue;
-        if (n < 0) {
-            message(name, std::strerror(errno));
-            if (fd > 0) ::close(fd);
-            return {EXIT_INPUT};
-        }
-        if (n == 0) break;
-        const size_t got = static_cast<size_t>(n);
-        const size_t h = std::min(sizeof head - head_size, got);
-        std::memcpy(head + head_size, buf, h);
-        head_size += h;
-        total += got;
-        for (size_t off = 0; off < got;) {
-            size_t used = 0;
-            vamrnb_stream_frame f{};
-            st = vamrnb_stream_read(reader.get(), buf + off, got - off, &used, &f);
-            off += used;
-            if (st == VAMRNB_STREAM_ERR_TOC) bad_byte = buf[off];
-            if (st < 0) break;
-            if (st != VAMRNB_STREAM_FRAME) continue;
+    uint64_t by_type[16] = {}, bad = 0, padded = 0, first_padding = 0, frames = 0;
+    StreamScan scan;
+    const int rc = scan_stream(
+        in,
+        [&](const vamrnb_stream_frame &f) {
             ++frames;
             ++by_type[f.type];
             if (!f.quality) ++bad;
             if (f.padding && padded++ == 0) first_padding = f.offset;
-        }
-        if (st < 0) break;
+            return 0;
+        },
+        {}, scan);
+    if (rc != EXIT_OK) {
+        message(name, scan.read_error);
+        return {rc};
     }
-    if (fd > 0) ::close(fd);
-    vamrnb_stream_frame partial{};
-    if (st >= 0) st = vamrnb_stream_finish(reader.get(), &partial);
-    const uint64_t at = vamrnb_stream_reader_offset(reader.get());
-
+    const int32_t st = scan.status;
+    const vamrnb_stream_frame &partial = scan.partial;
+    const uint64_t at = scan.offset;
+    uint64_t total = scan.bytes;
     total = std::max(total, input_size(in));  // reading stops early on a foreign file
     std::lock_guard<std::mutex> lock(g_out);
     if (st != AMRNB_OK && st != VAMRNB_STREAM_ERR_TRUNCATED && st != VAMRNB_STREAM_ERR_TOC) {
-        const std::string why = total == 0 ? "empty file" : explain_foreign(head, head_size, st);
+        const std::string why = total == 0 ? "empty file" : explain_foreign(scan.head, scan.head_size, st);
         if (o.json) {
             const char *fmt = st == VAMRNB_STREAM_ERR_WIDEBAND ? "AMR-WB"
                               : st == VAMRNB_STREAM_ERR_MULTICHANNEL ? "AMR-NB multi-channel"
-                              : starts(head, head_size, "ftyp", 4) ? "MP4/3GPP container"
+                              : starts(scan.head, scan.head_size, "ftyp", 4) ? "MP4/3GPP container"
                                                                    : "unknown";
             std::printf("{\"file\":%s,\"format\":%s,\"file_bytes\":%llu,\"error\":%s}\n", json_string(in).c_str(),
                         json_string(fmt).c_str(), static_cast<unsigned long long>(total), json_string(why).c_str());
@@ -144,7 +111,7 @@ Outcome info_file(const Options &o, const std::string &in) {
                           partial.offset});
     if (st == VAMRNB_STREAM_ERR_TOC)
         damage.push_back({"bad_toc", format("invalid frame header byte 0x%02X (F bit set); the rest is unread",
-                                            bad_byte), at});
+                                            scan.bad_byte), at});
 
     const double duration = static_cast<double>(frames) * 0.02;
     uint64_t speech = 0;

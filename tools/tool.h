@@ -6,8 +6,11 @@
 #include <cstddef>
 #include <cstdint>
 #include <cstdio>
+#include <functional>
 #include <string>
 #include <vector>
+
+#include "vamrnb_stream.h"
 
 namespace tool {
 
@@ -96,6 +99,26 @@ uint64_t input_size(const std::string &path);
 // One sentence saying what a file that is not AMR-NB storage format is and
 // how to convert it, from its first bytes and the reader's status.
 std::string explain_foreign(const uint8_t *head, size_t size, int32_t status);
+
+// What walking an .amr input found.
+struct StreamScan {
+    int32_t status = 0;             // the reader's status at the end (AMRNB_OK: clean)
+    uint64_t bytes = 0;             // input bytes read
+    uint64_t offset = 0;            // the reader's offset at the end
+    unsigned bad_byte = 0;          // the byte refused with VAMRNB_STREAM_ERR_TOC
+    vamrnb_stream_frame partial{};  // the cut-off frame of VAMRNB_STREAM_ERR_TRUNCATED
+    uint8_t head[16];               // the first bytes, to say what a foreign file is
+    size_t head_size = 0;
+    std::string read_error;         // why the input could not be read
+};
+
+// Reads path ("-": standard input) through the stream reader, calling on_frame
+// for every frame (a non-zero result stops the walk and is returned) and
+// on_block (may be empty) with the bytes read so far after every block.
+// Returns EXIT_OK when the whole input was walked (see s.status), or an exit
+// code with s.read_error set.
+int scan_stream(const std::string &path, const std::function<int(const vamrnb_stream_frame &)> &on_frame,
+                const std::function<void(uint64_t)> &on_block, StreamScan &s);
 
 Outcome encode_file(const Options &o, const std::string &in, const std::string &out);
 Outcome decode_file(const Options &o, const std::string &in, const std::string &out);
