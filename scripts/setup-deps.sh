@@ -7,7 +7,7 @@ set -euo pipefail
 
 vamrnb_packages=(cmake g++ make pkg-config googletest libgtest-dev libbenchmark-dev
                  g++-arm-linux-gnueabihf qemu-user clang libsndfile1-dev libsoxr-dev
-                 python3)
+                 python3 tshark)
 
 vamrnb_setup_deps() {
     if ! command -v dpkg-query >/dev/null 2>&1; then
@@ -28,6 +28,8 @@ vamrnb_setup_deps() {
     fi
     echo "setup: installing ${missing[*]}"
     export DEBIAN_FRONTEND=noninteractive
+    # tshark: no set-uid capture helper, and so no question during installation.
+    echo "wireshark-common wireshark-common/install-setuid boolean false" | debconf-set-selections
     apt-get update
     apt-get install -y "${missing[@]}"
 }
