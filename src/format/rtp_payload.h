@@ -39,10 +39,25 @@ inline int crc_bits(int ft) {
 }
 
 // 8-bit CRC, generator x^8 + x^4 + x^3 + x^2 + 1, register starting at 0,
-// over the first `bits` bits of `data`, most significant bit of each byte first.
+// over the first `bits` bits of `data`, most significant bit of each byte
+// first: whole bytes through a table, the rest of the bits one by one.
+struct crc8_table {
+    uint8_t t[256];
+    constexpr crc8_table() : t{} {
+        for (int b = 0; b < 256; ++b) {
+            uint32_t reg = static_cast<uint32_t>(b);
+            for (int i = 0; i < 8; ++i) reg = ((reg << 1) ^ ((reg & 0x80u) ? 0x1Du : 0u)) & 0xFFu;
+            t[b] = static_cast<uint8_t>(reg);
+        }
+    }
+};
+inline constexpr crc8_table kCrc8{};
+
 inline uint8_t crc8(const uint8_t *data, int bits) {
     uint32_t reg = 0;
-    for (int i = 0; i < bits; ++i) {
+    int i = 0;
+    for (; i + 8 <= bits; i += 8) reg = kCrc8.t[reg ^ data[i >> 3]];
+    for (; i < bits; ++i) {
         const uint32_t in = (data[i >> 3] >> (7 - (i & 7))) & 1u;
         const uint32_t top = ((reg >> 7) & 1u) ^ in;
         reg = (reg << 1) & 0xFFu;

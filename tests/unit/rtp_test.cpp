@@ -110,6 +110,8 @@ TEST(Rtp, GoldenPackets) {
     // indication's middle bit are set: x^8 (x^3 + x) mod the generator is
     // x^7 + x^6 + x^4 + x.
     EXPECT_EQ(crc[5], 0xD2);
+    // The 7.4 kbit/s frame's 61 class A bits 1, 0, 1, ..., 1 by long division.
+    EXPECT_EQ(crc[4], 0x46);
 }
 
 TEST(Rtp, CrcMarksDamagedFramesBad) {
