@@ -150,6 +150,11 @@ TEST(Rtp, MalformedPayloadsAreRefused) {
         bytes longer = good;
         longer.push_back(0);
         EXPECT_EQ(parse(p, longer), VAMRNB_RTP_ERR_TRAILING) << oa;
+        // Two NO_DATA entries fill the first two bytes exactly: no padding
+        // at all, so one more byte is trailing.
+        const bytes exact = oa ? bytes{0xF0, 0xFC, 0x7C} : bytes{0xFF, 0xDF};
+        EXPECT_EQ(parse(p, exact), AMRNB_OK) << oa;
+        EXPECT_EQ(parse(p, cat({exact, {0}})), VAMRNB_RTP_ERR_TRAILING) << oa;
 
         // The F bit of the last entry set: the chain runs on into the frames
         // and past the end of the payload.
@@ -235,6 +240,7 @@ TEST(Rtp, EveryBundledStreamRoundTrips) {
         at.push_back(pos);
         frames_total += at.size() - 1;
 
+        bytes carried;
         for (const vamrnb_rtp_params &p : modes)
             for (size_t per : {1, 2, 3, 10}) {
                 bytes joined;
@@ -254,27 +260,16 @@ TEST(Rtp, EveryBundledStreamRoundTrips) {
                     ++packets;
                 }
                 ASSERT_EQ(joined, stream);
+                if (&p == &modes[0] && per == 3) carried = joined;
             }
 
-        // Decoding what came out of 3-frame bandwidth-efficient packets gives
-        // the direct decode, sample for sample.
+        // The decoder gives the same output for the stream as it came from
+        // 3-frame bandwidth-efficient packets (NO_DATA for reserved types
+        // included) as for the file itself.
         codec_config cfg{};
         cfg.dec.layout = 1;  // 16-bit mono, one interleaved buffer
         vamrnb_decoder *direct = vamrnbd_create(&cfg, nullptr);
         vamrnb_decoder *via = vamrnbd_create(&cfg, nullptr);
-        bytes carried;
-        for (size_t i = 0; i + 1 < at.size(); i += 3) {
-            const size_t j = std::min(i + 3, at.size() - 1);
-            bytes back;
-            ASSERT_EQ(parse(modes[0],
-                            pack(modes[0], 15,
-                                 bytes(stream.begin() + static_cast<long>(at[i]),
-                                       stream.begin() + static_cast<long>(at[j]))),
-                            &back),
-                      AMRNB_OK);
-            carried.insert(carried.end(), back.begin(), back.end());
-        }
-        ASSERT_EQ(carried, stream);
         bytes direct_in(file.begin() + 6, file.end());
         for (size_t k = 0; k + 1 < at.size(); ++k) {
             const size_t off = at[k];
