@@ -1,5 +1,6 @@
-/*
- * vamrnb — AMR over RTP.
+/**
+ * @file vamrnb_rtp.h
+ * @brief AMR over RTP: payload packing and parsing, mode requests, SDP.
  *
  * Packs the storage-format frames the encoder emits into one RTP payload and
  * parses a received payload back into storage-format frames that
