@@ -7,7 +7,8 @@ no protocol warning.  The example's receive direction must give the stream
 back byte for byte.
 
 usage: tshark_check.py <amr_rtp_pcap> <source dir> <work dir>
-Exits 77 (skipped) when tshark is not installed.
+Without tshark only the example's round trip is checked, and the test exits
+77 (skipped) if that passed.
 """
 import pathlib
 import shutil
@@ -31,9 +32,7 @@ def frames_of(data):
 
 
 def main():
-    if shutil.which("tshark") is None:
-        print("tshark not installed: skipped")
-        return 77
+    have_tshark = shutil.which("tshark") is not None
     tool, src, work = sys.argv[1], pathlib.Path(sys.argv[2]), pathlib.Path(sys.argv[3])
     work.mkdir(parents=True, exist_ok=True)
     streams = sorted((src / "tests/data/vectors").rglob("*.amr"))
@@ -51,6 +50,8 @@ def main():
         if back.read_bytes() != joined.read_bytes():
             print(f"{name}: receive did not give the stream back")
             failures += 1
+        if not have_tshark:
+            continue
 
         out = subprocess.run(
             ["tshark", "-r", pcap, "-d", "udp.port==5004,rtp", "-d", "rtp.pt==97,amr",
@@ -77,7 +78,12 @@ def main():
         failures += bad
         print(f"{name}: {len(out)} packets, {len(frames)} frames of {len(streams)} streams, "
               f"{per} per packet: {'all' if not bad else len(out) - bad} agree with tshark")
-    return 1 if failures else 0
+    if failures:
+        return 1
+    if not have_tshark:
+        print("tshark not installed: the round trip passed, the dissector check was skipped")
+        return 77
+    return 0
 
 
 if __name__ == "__main__":
