@@ -5,9 +5,11 @@
 // playing, the padded last frame, and an arbitrary source through decodebin.
 #include <gst/gst.h>
 #include <gtest/gtest.h>
+#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cmath>
+#include <cstdio>
 #include <cstring>
 #include <filesystem>
 #include <fstream>
@@ -216,6 +218,25 @@ protected:
         if (!have({__VA_ARGS__}))                                         \
             GTEST_SKIP() << missing << " is not installed (gstreamer1.0-plugins-base/good)"; \
     } while (0)
+
+TEST_F(GstTest, InspectListsCapsAndProperties) {
+    const struct { const char *element; std::vector<const char *> shown; } cases[] = {
+        {"vamrnbdec", {"audio/AMR", "S16LE", "S24LE", "S8", "channels: [ 1, 2 ]"}},
+        {"vamrnbenc", {"audio/AMR", "S16LE", "band-mode", "MR475", "dtx", "vad", "file-header",
+                       "send-no-data"}}};
+    for (const auto &c : cases) {
+        FILE *p = ::popen((std::string("gst-inspect-1.0 ") + c.element + " 2>&1").c_str(), "r");
+        ASSERT_NE(p, nullptr);
+        std::string text;
+        char chunk[4096];
+        for (size_t n; (n = std::fread(chunk, 1, sizeof chunk, p)) > 0;) text.append(chunk, n);
+        const int status = ::pclose(p);
+        if (WIFEXITED(status) && WEXITSTATUS(status) == 127)  // the shell found no program
+            GTEST_SKIP() << "gst-inspect-1.0 is not installed (gstreamer1.0-tools)";
+        for (const char *s : c.shown)
+            EXPECT_NE(text.find(s), std::string::npos) << c.element << " does not show " << s;
+    }
+}
 
 TEST_F(GstTest, AmrparseDecodingEqualsLibraryInEveryOutputFormat) {
     NEEDS("amrparse", "filesrc", "filesink");
