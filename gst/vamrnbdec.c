@@ -20,6 +20,9 @@ GST_DEBUG_CATEGORY_STATIC (vamrnbdec_debug);
 /* A lost frame is handed to the decoder as a no-data frame: its
  * table-of-contents byte alone. */
 #define NO_DATA_TOC 0x7C
+/* Concealment fades to silence well within this; a longer hole (a stream
+ * paused for minutes) is not filled, only its last frames are. */
+#define MAX_CONCEALED 250
 
 struct _GstVamrnbDec
 {
@@ -219,16 +222,17 @@ gst_vamrnb_dec_handle_frame (GstAudioDecoder * dec, GstBuffer * buffer)
     /* Frames are missing before this buffer (an RTP packet was dropped, say):
      * conceal them first and move the buffer's timestamp back to where the
      * hole starts, so that the output stays continuous. */
-    lost = (guint) ((pts - self->next_pts + FRAME_NS / 2) / FRAME_NS);
+    lost = (guint) MIN ((pts - self->next_pts + FRAME_NS / 2) / FRAME_NS,
+        MAX_CONCEALED);
     GST_DEBUG_OBJECT (self, "%u frames lost before %" GST_TIME_FORMAT, lost,
         GST_TIME_ARGS (pts));
-    pts = self->next_pts;
+    pts -= MIN (pts, lost * FRAME_NS);
     GST_BUFFER_PTS (buffer) = pts;
   }
   if (gap) {
     /* A stretch of lost audio: as many frames as it lasts, at least one. */
     guint n = GST_CLOCK_TIME_IS_VALID (duration)
-        ? (guint) ((duration + FRAME_NS / 2) / FRAME_NS) : 0;
+        ? (guint) MIN ((duration + FRAME_NS / 2) / FRAME_NS, MAX_CONCEALED) : 0;
     lost += n > 0 ? n : 1;
   }
 
