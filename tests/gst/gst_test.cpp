@@ -302,9 +302,18 @@ TEST_F(GstTest, LostFramesAreConcealedInEveryFormUpstreamReportsThem) {
         }
         return GST_PAD_PROBE_OK;
     };
+    // The concealed audio sits where the lost audio was: no jumps or overlaps.
+    GstClockTime next = 0;
+    Probe continuous = [&next](GstPad *, GstPadProbeInfo *info, unsigned i) {
+        const GstBuffer *buf = GST_PAD_PROBE_INFO_BUFFER(info);
+        EXPECT_EQ(GST_BUFFER_PTS(buf), next) << "output buffer " << i;
+        next = GST_BUFFER_PTS(buf) + gst_buffer_get_size(const_cast<GstBuffer *>(buf)) / 2 * 125000;
+        return GST_PAD_PROBE_OK;
+    };
     run("filesrc location=" + amr.string() + " ! amrparse ! vamrnbdec name=dec ! filesink "
-        "location=" + path("out.pcm"), {{"dec.sink", lose}});
+        "location=" + path("out.pcm"), {{"dec.sink", lose}, {"dec.src", continuous}});
     EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(read_bytes(amr), 0, 1, {30, 31, 32, 200, 250}));
+    EXPECT_EQ(next, 425 * kFrameNs);
 }
 
 TEST_F(GstTest, ThreeGppFileDecodesLikeTheAmrFile) {
