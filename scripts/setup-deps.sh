@@ -7,7 +7,11 @@ set -euo pipefail
 
 vamrnb_packages=(cmake g++ make pkg-config googletest libgtest-dev libbenchmark-dev
                  g++-arm-linux-gnueabihf qemu-user clang libsndfile1-dev libsoxr-dev
-                 python3 tshark)
+                 python3
+                 tshark
+                 libgstreamer1.0-dev libgstreamer-plugins-base1.0-dev gstreamer1.0-tools
+                 gstreamer1.0-plugins-base gstreamer1.0-plugins-good
+)
 
 vamrnb_setup_deps() {
     if ! command -v dpkg-query >/dev/null 2>&1; then
