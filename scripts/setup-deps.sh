@@ -7,7 +7,8 @@ set -euo pipefail
 
 vamrnb_packages=(cmake g++ make pkg-config googletest libgtest-dev libbenchmark-dev
                  g++-arm-linux-gnueabihf qemu-user clang libsndfile1-dev libsoxr-dev
-                 python3)
+                 python3 python3-dev python3-numpy python3-pybind11 python3-pytest
+                 python3-setuptools python3-build python3-venv python3-mypy)
 
 vamrnb_setup_deps() {
     if ! command -v dpkg-query >/dev/null 2>&1; then

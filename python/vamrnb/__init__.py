@@ -198,6 +198,8 @@ def _to_int16(x: np.ndarray) -> np.ndarray:
 
 def _checked_audio(audio: Any, what: str) -> np.ndarray:
     a = np.asarray(audio)
+    if a.dtype.kind == "i" and a.dtype.itemsize == 2:
+        a = a.astype(np.int16, copy=False)  # native byte order
     if a.dtype != np.int16 and not np.issubdtype(a.dtype, np.floating):
         raise TypeError(f"{what} must be int16 or floating point, not {a.dtype}")
     if a.dtype != np.int16 and not np.isfinite(a).all():
