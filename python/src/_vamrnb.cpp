@@ -1,7 +1,7 @@
 // vamrnb._vamrnb: the compiled half of the Python package.  It holds the
 // codec loops (whole streams and single frames, with the interpreter lock
-// released while the codec runs), the storage-format walk and the libsoxr
-// resampler.  Argument checking, mode names, sources and error messages are
+// released while the codec runs), the walk over a stream with the library's
+// stream reader, and the libsoxr resampler.  Argument checking, mode names, sources and error messages are
 // the pure-Python half's job (vamrnb/__init__.py), so every entry point here
 // trusts the types and sizes it is given.
 #include <pybind11/numpy.h>
@@ -18,52 +18,48 @@
 #include <vector>
 
 #include "vamrnb.h"
-#include "vamrnb_tables.h"
+#include "vamrnb_stream.h"
 
 namespace py = pybind11;
 
 namespace {
 
 constexpr int kFrame = 160;
-constexpr char kMagic[] = "#!AMR\n";
-constexpr size_t kMagicSize = 6;
 
-// Bytes a frame of type ft occupies in a stream, table-of-contents byte
-// included; the size table leaves the reserved types 12 to 14 at 0 although
-// their table-of-contents byte is still there.
-size_t stream_bytes(int ft) { return std::max<size_t>(1, static_cast<size_t>(vamrnb_tbl_packed_size[ft])); }
-
-// Where the walk of a stream stopped.
-enum Stop { kEnd = 0, kBadHeader = 1, kTruncated = 2 };
-
+// The frames of a whole stream in memory, through the library's stream
+// reader: where each whole frame starts, and how the stream ended (0, or the
+// reader's status and the offset it names).
 struct Walk {
-    std::vector<size_t> offsets;  // table-of-contents byte of each whole frame
-    Stop stop = kEnd;
-    size_t stop_offset = 0;
+    std::vector<vamrnb_stream_frame> frames;
+    int32_t status = AMRNB_OK;
+    uint64_t offset = 0;
 };
 
-// Splits data[start..] into frames: stops at a byte that cannot be a
-// table-of-contents byte (F bit or padding bits set) or at a frame that runs
-// past the end.
-Walk walk(const uint8_t *data, size_t size, size_t start) {
+Walk walk(const uint8_t *data, size_t size) {
     Walk w;
-    size_t pos = start;
-    while (pos < size) {
-        const uint8_t toc = data[pos];
-        if (toc & 0x83) {
-            w.stop = kBadHeader;
-            w.stop_offset = pos;
-            return w;
-        }
-        const size_t n = stream_bytes((toc >> 3) & 15);
-        if (n > size - pos) {
-            w.stop = kTruncated;
-            w.stop_offset = pos;
-            return w;
-        }
-        w.offsets.push_back(pos);
-        pos += n;
+    int32_t status = AMRNB_OK;
+    vamrnb_stream_reader *reader = vamrnb_stream_reader_create(&status);
+    if (!reader) throw std::bad_alloc();
+    size_t pos = 0, used = 0;
+    vamrnb_stream_frame frame{};
+    while ((status = vamrnb_stream_read(reader, data + pos, size - pos, &used, &frame)) ==
+           VAMRNB_STREAM_FRAME) {
+        w.frames.push_back(frame);
+        pos += used;
     }
+    if (status == AMRNB_OK) {
+        vamrnb_stream_frame partial{};
+        status = vamrnb_stream_finish(reader, &partial);
+        w.offset = status == VAMRNB_STREAM_ERR_TRUNCATED ? partial.offset : size;
+    } else {
+        w.offset = vamrnb_stream_reader_offset(reader);
+    }
+    // A wrong or unsupported file header is the whole stream's fault.
+    if (status == VAMRNB_STREAM_ERR_MAGIC || status == VAMRNB_STREAM_ERR_WIDEBAND ||
+        status == VAMRNB_STREAM_ERR_MULTICHANNEL)
+        w.offset = 0;
+    w.status = status;
+    vamrnb_stream_reader_delete(reader);
     return w;
 }
 
@@ -155,22 +151,16 @@ void to_float(const int16_t *in, float *out, size_t n) {
     for (size_t i = 0; i < n; ++i) out[i] = static_cast<float>(in[i]) * (1.0f / 32768.0f);
 }
 
-// Whole stream: (samples, stop, stop_offset, frames decoded).  Refused frame
-// types give no samples; the walk's stop tells the caller whether the data
-// ended cleanly.
+// Whole stream: (samples, status, offset) with the walk's ending.  Refused
+// frame types give no samples.
 py::tuple decode_stream(const py::buffer &src, bool as_float) {
     const Bytes b(src);
-    if (b.size() < kMagicSize || std::memcmp(b.data(), kMagic, kMagicSize) != 0)
-        throw py::value_error("missing stream header");
     Walk w;
     size_t speech = 0;
     {
         py::gil_scoped_release unlocked;
-        w = walk(b.data(), b.size(), kMagicSize);
-        for (size_t off : w.offsets) {
-            const int ft = (b.data()[off] >> 3) & 15;
-            speech += ft != 10 && ft != 11;
-        }
+        w = walk(b.data(), b.size());
+        for (const auto &f : w.frames) speech += f.type != 10 && f.type != 11;
     }
     py::array out = as_float ? py::array(frame_array<float>(speech * kFrame))
                              : py::array(frame_array<int16_t>(speech * kFrame));
@@ -180,28 +170,24 @@ py::tuple decode_stream(const py::buffer &src, bool as_float) {
         DecoderCore dec;
         int16_t pcm[kFrame];
         size_t k = 0;
-        for (size_t off : w.offsets) {
+        for (const auto &f : w.frames) {
             int16_t *frame_out = as_float ? pcm : static_cast<int16_t *>(dst) + k * kFrame;
-            if (!dec.decode(b.data() + off, stream_bytes((b.data()[off] >> 3) & 15), frame_out))
-                continue;
+            if (!dec.decode(f.data, f.size, frame_out)) continue;
             if (as_float) to_float(pcm, static_cast<float *>(dst) + k * kFrame, kFrame);
             ++k;
         }
     }
-    return py::make_tuple(out, static_cast<int>(w.stop), w.stop_offset, speech);
+    return py::make_tuple(out, w.status, w.offset);
 }
 
-// Frames of a stream as (offset, type, quality) rows, plus where the walk
-// stopped.
-py::tuple walk_stream(const py::buffer &src, size_t start) {
+// Frames of a stream as (offset, type, quality) rows, with the walk's ending.
+py::tuple walk_stream(const py::buffer &src) {
     const Bytes b(src);
-    const Walk w = walk(b.data(), b.size(), start);
-    py::list rows(w.offsets.size());
-    for (size_t i = 0; i < w.offsets.size(); ++i) {
-        const uint8_t toc = b.data()[w.offsets[i]];
-        rows[i] = py::make_tuple(w.offsets[i], (toc >> 3) & 15, ((toc >> 2) & 1) != 0);
-    }
-    return py::make_tuple(rows, static_cast<int>(w.stop), w.stop_offset);
+    const Walk w = walk(b.data(), b.size());
+    py::list rows(w.frames.size());
+    for (size_t i = 0; i < w.frames.size(); ++i)
+        rows[i] = py::make_tuple(w.frames[i].offset, w.frames[i].type, w.frames[i].quality != 0);
+    return py::make_tuple(rows, w.status, w.offset);
 }
 
 // Whole signal, already 8 kHz mono 16-bit: the stream header and one frame
@@ -214,8 +200,8 @@ py::bytes encode_stream(EncoderCore &enc, const py::array_t<int16_t, py::array::
         py::gil_scoped_release unlocked;
         std::lock_guard<std::mutex> hold(enc.lock);
         const size_t frames = (n + kFrame - 1) / kFrame;
-        out.reserve(kMagicSize + frames * 32);
-        out.append(kMagic, kMagicSize);
+        out.reserve(VAMRNB_STREAM_MAGIC_SIZE + frames * VAMRNB_STREAM_MAX_FRAME);
+        out.append(VAMRNB_STREAM_MAGIC, VAMRNB_STREAM_MAGIC_SIZE);
         uint8_t bits[32];
         for (size_t f = 0; f < frames; ++f) {
             int16_t frame[kFrame] = {};
@@ -302,12 +288,14 @@ PYBIND11_MODULE(_vamrnb, m) {
             e.set_mode(mode);
         });
     m.def("decode_stream", &decode_stream, py::arg("data"), py::arg("as_float"));
-    m.def("walk_stream", &walk_stream, py::arg("data"), py::arg("start"));
+    m.def("walk_stream", &walk_stream, py::arg("data"));
+    m.def("strerror", &vamrnb_strerror, py::arg("status"));
+    m.attr("STREAM_ERR_TRUNCATED") = static_cast<int>(VAMRNB_STREAM_ERR_TRUNCATED);
     m.def("resample", &resample, py::arg("signal"), py::arg("rate"));
     m.attr("FRAME_BYTES") = [] {
         py::tuple t(16);
-        for (int ft = 0; ft < 16; ++ft) t[static_cast<size_t>(ft)] = stream_bytes(ft);
+        for (int ft = 0; ft < 16; ++ft) t[static_cast<size_t>(ft)] = vamrnb_stream_frame_size(ft);
         return t;
     }();
-    m.attr("VERSION") = py::make_tuple(VAMRNB_VERSION_MAJOR, VAMRNB_VERSION_MINOR, VAMRNB_VERSION_PATCH);
+    m.attr("VERSION") = vamrnb_version();
 }

@@ -29,7 +29,7 @@ from . import _vamrnb
 __all__ = ["decode", "encode", "Encoder", "Decoder", "frames", "info", "Frame", "Error",
            "MODES", "SAMPLE_RATE", "FRAME_SAMPLES", "__version__"]
 
-__version__ = "%d.%d.%d" % _vamrnb.VERSION
+__version__ = _vamrnb.VERSION
 
 #: Sample rate of every decoded signal and of the encoder's input, in Hz.
 SAMPLE_RATE = 8000
@@ -38,7 +38,6 @@ FRAME_SAMPLES = 160
 #: Codec modes by bit rate, index = mode number (MR475 .. MR122).
 MODES = ("4.75", "5.15", "5.9", "6.7", "7.4", "7.95", "10.2", "12.2")
 
-_MAGIC = b"#!AMR\n"
 _FRAME_BYTES = _vamrnb.FRAME_BYTES
 _MODE_IDS = ("MR475", "MR515", "MR59", "MR67", "MR74", "MR795", "MR102", "MR122")
 # Every spelling the command-line tool accepts, lower case.
@@ -138,31 +137,18 @@ def _read(src: Source) -> Union[bytes, memoryview]:
     return data
 
 
-def _stream(src: Source) -> Union[bytes, memoryview]:
-    """The bytes of src, checked to start with the AMR-NB header."""
-    data = _read(src)
-    head = bytes(data[:12])
-    if head.startswith(_MAGIC):
-        return data
-    if not head:
-        raise Error("empty stream", 0)
-    if head.startswith(b"#!AMR-WB\n"):
-        raise Error("AMR-WB (wideband) stream, only AMR-NB is supported", 0)
-    if head.startswith(b"#!AMR_MC1.0\n"):
-        raise Error("multi-channel AMR stream, not supported", 0)
-    raise Error("not an AMR-NB stream (no '#!AMR\\n' header)", 0)
-
-
-def _bad_header(data: Union[bytes, memoryview], offset: int) -> Error:
-    return Error(f"invalid frame header byte 0x{data[offset]:02X} (corrupt data, or not "
-                 "AMR-NB storage format)", offset)
-
-
-def _warn_truncated(data: Union[bytes, memoryview], offset: int, complete: int) -> None:
-    ft = (data[offset] >> 3) & 15
-    warnings.warn(f"truncated last frame at byte {offset} (frame type {ft} needs "
-                  f"{_FRAME_BYTES[ft]} bytes, {len(data) - offset} left); "
-                  f"{complete} complete frames used", stacklevel=3)
+def _ending(data: Union[bytes, memoryview], status: int, offset: int, complete: int) -> None:
+    """Raises Error for a stream that ended badly, or warns about a truncated
+    last frame; the walk over data reported status at offset."""
+    if status == _vamrnb.STREAM_ERR_TRUNCATED:
+        ft = (data[offset] >> 3) & 15
+        warnings.warn(f"truncated last frame at byte {offset} (frame type {ft} needs "
+                      f"{_FRAME_BYTES[ft]} bytes, {len(data) - offset} left); "
+                      f"{complete} complete frames used", stacklevel=3)
+    elif status < 0:
+        if offset == 0 and not data:
+            raise Error("empty stream", 0)
+        raise Error(_vamrnb.strerror(status), offset)
 
 
 def decode(src: Source, dtype: Any = "int16") -> Tuple[np.ndarray, int]:
@@ -182,12 +168,9 @@ def decode(src: Source, dtype: Any = "int16") -> Tuple[np.ndarray, int]:
     decoded.
     """
     as_float = _float_output(dtype)
-    data = _stream(src)
-    samples, stop, offset, _ = _vamrnb.decode_stream(data, as_float)
-    if stop == 1:
-        raise _bad_header(data, offset)
-    if stop == 2:
-        _warn_truncated(data, offset, len(samples) // FRAME_SAMPLES)
+    data = _read(src)
+    samples, status, offset = _vamrnb.decode_stream(data, as_float)
+    _ending(data, status, offset, len(samples) // FRAME_SAMPLES)
     return samples, SAMPLE_RATE
 
 
@@ -332,8 +315,8 @@ class Decoder:
         data = frame if isinstance(frame, bytes) else memoryview(frame).cast("B")
         if len(data) == 0:
             raise ValueError("empty frame")
-        if data[0] & 0x83:
-            raise _bad_header(data, 0)
+        if data[0] & 0x80:
+            raise Error("invalid table-of-contents byte (F bit set)", 0)
         need = _FRAME_BYTES[(data[0] >> 3) & 15]
         if len(data) != need:
             raise ValueError(f"frame type {(data[0] >> 3) & 15} takes {need} bytes, "
@@ -353,10 +336,6 @@ class Decoder:
         return f"Decoder(dtype={'float32' if self._float else 'int16'!r})"
 
 
-def _walk(data: Union[bytes, memoryview]) -> Tuple[list, int, int]:
-    return _vamrnb.walk_stream(data, len(_MAGIC))
-
-
 def frames(src: Source) -> Iterator[Frame]:
     """Iterates over the frames of an AMR-NB file.
 
@@ -366,16 +345,15 @@ def frames(src: Source) -> Iterator[Frame]:
         invalid frame header.  A truncated last frame ends the iteration with a
         warning.
     """
-    data = _stream(src)
-    rows, stop, offset = _walk(data)
+    data = _read(src)
+    rows, status, offset = _vamrnb.walk_stream(data)
+    if not rows and status != _vamrnb.STREAM_ERR_TRUNCATED:
+        _ending(data, status, offset, 0)  # not a stream at all: fail at once
 
     def generate() -> Iterator[Frame]:
         for off, ft, q in rows:
             yield Frame(ft, q, bytes(data[off:off + _FRAME_BYTES[ft]]))
-        if stop == 1:
-            raise _bad_header(data, offset)
-        if stop == 2:
-            _warn_truncated(data, offset, len(rows))
+        _ending(data, status, offset, len(rows))
 
     return generate()
 
@@ -396,8 +374,10 @@ def info(src: Source) -> Dict[str, Any]:
         offset: the counts cover the frames before it).
     :raises Error: not an AMR-NB file.
     """
-    data = _stream(src)
-    rows, stop, offset = _walk(data)
+    data = _read(src)
+    rows, status, offset = _vamrnb.walk_stream(data)
+    if not rows and status != _vamrnb.STREAM_ERR_TRUNCATED:
+        _ending(data, status, offset, 0)
     by_type = [0] * 16
     sid_modes: Dict[str, int] = {}
     payload = bad = 0
@@ -414,10 +394,8 @@ def info(src: Source) -> Dict[str, Any]:
     count = len(rows) - by_type[10] - by_type[11]
     duration = count * 0.02
     problem = None
-    if stop == 1:
-        problem = str(_bad_header(data, offset))
-    elif stop == 2:
-        problem = f"truncated last frame at byte {offset}"
+    if status < 0:
+        problem = f"{_vamrnb.strerror(status)} at byte {offset}"
     return {
         "duration": duration,
         "frames": count,
