@@ -1,9 +1,10 @@
 // vamrnb._vamrnb: the compiled half of the Python package.  It holds the
 // codec loops (whole streams and single frames, with the interpreter lock
 // released while the codec runs), the walk over a stream with the library's
-// stream reader, and the libsoxr resampler.  Argument checking, mode names, sources and error messages are
-// the pure-Python half's job (vamrnb/__init__.py), so every entry point here
-// trusts the types and sizes it is given.
+// stream reader, and the libsoxr resampler.  Argument checking, mode names,
+// sources and error messages are the pure-Python half's job
+// (vamrnb/__init__.py), so every entry point here trusts the types and sizes
+// it is given.
 #include <pybind11/numpy.h>
 #include <pybind11/pybind11.h>
 #include <pybind11/stl.h>
@@ -14,7 +15,7 @@
 #include <cstring>
 #include <mutex>
 #include <string>
-#include <tuple>
+#include <memory>
 #include <vector>
 
 #include "vamrnb.h"
@@ -38,7 +39,9 @@ struct Walk {
 Walk walk(const uint8_t *data, size_t size) {
     Walk w;
     int32_t status = AMRNB_OK;
-    vamrnb_stream_reader *reader = vamrnb_stream_reader_create(&status);
+    const std::unique_ptr<vamrnb_stream_reader, void (*)(vamrnb_stream_reader *)> owner(
+        vamrnb_stream_reader_create(&status), vamrnb_stream_reader_delete);
+    vamrnb_stream_reader *reader = owner.get();
     if (!reader) throw std::bad_alloc();
     size_t pos = 0, used = 0;
     vamrnb_stream_frame frame{};
@@ -59,7 +62,6 @@ Walk walk(const uint8_t *data, size_t size) {
         status == VAMRNB_STREAM_ERR_MULTICHANNEL)
         w.offset = 0;
     w.status = status;
-    vamrnb_stream_reader_delete(reader);
     return w;
 }
 
@@ -105,6 +107,7 @@ private:
 class EncoderCore {
 public:
     EncoderCore(int mode, bool dtx, int vad_option) {
+        check_mode(mode);
         codec_config cfg{};
         cfg.enc.dtx = dtx ? 1 : 0;
         cfg.enc.vad_option = vad_option;
@@ -130,9 +133,13 @@ public:
         return info_.bytes;
     }
     int mode() const { return mode_; }
+    // The caller checks the mode first, while it holds the interpreter lock.
     void set_mode(int mode) {
         vamrnbe_set_mode(enc_, mode);
         mode_ = mode;
+    }
+    static void check_mode(int mode) {
+        if (mode < MR475 || mode > MR122) throw py::value_error("mode out of range 0..7");
     }
     std::mutex lock;
 
@@ -214,6 +221,7 @@ py::bytes encode_stream(EncoderCore &enc, const py::array_t<int16_t, py::array::
 }
 
 py::bytes encode_frame(EncoderCore &enc, const py::array_t<int16_t, py::array::c_style> &frame) {
+    if (frame.size() != kFrame) throw py::value_error("a frame is 160 samples");
     uint8_t bits[32];
     size_t got;
     {
@@ -283,6 +291,7 @@ PYBIND11_MODULE(_vamrnb, m) {
         .def("encode", &encode_frame, py::arg("frame"))
         .def("encode_stream", &encode_stream, py::arg("pcm"))
         .def_property("mode", &EncoderCore::mode, [](EncoderCore &e, int mode) {
+            EncoderCore::check_mode(mode);
             py::gil_scoped_release unlocked;
             std::lock_guard<std::mutex> hold(e.lock);
             e.set_mode(mode);
