@@ -160,8 +160,9 @@ def decode(src: Source, dtype: Any = "int16") -> Tuple[np.ndarray, int]:
         samples divided by 32768, within -1.0..1.0).
     :return: ``(samples, 8000)``: a 1-D array of 160 samples per frame; frames
         of the unused types 10 and 11 give no samples.
-    :raises Error: the data is not an AMR-NB file or a frame header is invalid
-        (the message and ``offset`` name the byte).
+    :raises Error: the data is not an AMR-NB file (AMR-WB and multi-channel
+        files included), or a table-of-contents byte has its F bit set (the
+        message and ``offset`` name the byte).
     :raises TypeError, ValueError: bad arguments.
 
     A truncated last frame is dropped with a warning; the complete frames are
@@ -342,8 +343,8 @@ def frames(src: Source) -> Iterator[Frame]:
     :param src: as for ``decode``.
     :return: an iterator of ``Frame(type, quality, data)``.
     :raises Error: not an AMR-NB file, or (after the frames before it) an
-        invalid frame header.  A truncated last frame ends the iteration with a
-        warning.
+        invalid table-of-contents byte.  A truncated last frame ends the
+        iteration with a warning.
     """
     data = _read(src)
     rows, status, offset = _vamrnb.walk_stream(data)
