@@ -1,3 +1,5 @@
+# Types of the vamrnb package's public interface; ctest's python_stubs test checks
+# them against the compiled package with mypy's stubtest.
 import os
 from typing import IO, Any, Dict, Iterator, NamedTuple, Tuple, Union
 
