@@ -11,6 +11,8 @@ vamrnb_packages=(cmake g++ make pkg-config googletest libgtest-dev libbenchmark-
                  tshark
                  libgstreamer1.0-dev libgstreamer-plugins-base1.0-dev gstreamer1.0-tools
                  gstreamer1.0-plugins-base gstreamer1.0-plugins-good
+                 python3-dev python3-numpy python3-pybind11 python3-pytest
+                 python3-setuptools python3-build python3-venv python3-mypy
 )
 
 vamrnb_setup_deps() {
