@@ -15,6 +15,7 @@
 #include <vector>
 
 #include "vamrnb.h"
+#include "vamrnb_stream.h"
 
 namespace {
 
@@ -22,7 +23,6 @@ constexpr const char *kItem = "speech_en-US_f_allison_demo-instruct_long";
 constexpr int kFrames = 3000;  // 60 s
 constexpr const char *kModes[8] = {"MR475", "MR515", "MR59", "MR67",
                                    "MR74",  "MR795", "MR102", "MR122"};
-constexpr int kFileFrameBytes[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6, 1, 1, 1, 1};
 
 std::string vectors_dir() {
     if (const char *env = std::getenv("VAMRNB_VECTORS")) return env;
@@ -43,7 +43,7 @@ std::vector<std::vector<uint8_t>> load(int mode) {
         all.insert(all.end(), chunk, chunk + n);
     std::fclose(f);
     for (size_t pos = 6; pos < all.size() && frames.size() < kFrames;) {  // skip "#!AMR\n"
-        const size_t len = kFileFrameBytes[(all[pos] >> 3) & 15];
+        const size_t len = vamrnb_stream_frame_size((all[pos] >> 3) & 15);
         if (pos + len > all.size()) break;
         frames.emplace_back(all.begin() + pos, all.begin() + pos + len);
         pos += len;

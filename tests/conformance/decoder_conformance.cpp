@@ -23,7 +23,7 @@ struct DecodeJob {
 
 // Bytes the decoder reports as consumed for a frame of each type: the whole
 // frame, except FT 9 whose payload is not read.
-std::size_t consumed_bytes(int type) { return type == 9 ? 1 : kStorageSize[type]; }
+std::size_t consumed_bytes(int type) { return type == 9 ? 1 : vamrnb_stream_frame_size(type); }
 
 void decode_stream(const DecodeJob &job, Report &report) {
     const auto file = read_bytes(job.amr);

@@ -46,7 +46,7 @@ void decode_our_output(const EncodeJob &job, const std::vector<uint8_t> &stream,
     for (std::size_t pos = 0; pos < stream.size(); ++k) {
         bitstream_buffer in{const_cast<uint8_t *>(stream.data() + pos), 0,
                             static_cast<uint32_t>(stream.size() - pos)};
-        pos += kStorageSize[(stream[pos] >> 3) & 0x0F];
+        pos += vamrnb_stream_frame_size((stream[pos] >> 3) & 0x0F);
         if (vamrnbd_decode(dec, &in, &buffers, &info) == AMRNB_OK && k < crcs->size() &&
             frame_crc32(out) == (*crcs)[k])
             ++exact;

@@ -24,8 +24,6 @@
 
 namespace conformance {
 
-const int kStorageSize[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6, 1, 1, 1, 1};
-
 namespace {
 
 bool env_flag(const char *name) {
@@ -105,21 +103,20 @@ std::vector<fs::path> sorted_entries(const fs::path &dir, bool directories,
 
 std::vector<Frame> split_frames(const std::vector<uint8_t> &file, std::string &error) {
     std::vector<Frame> frames;
-    if (file.size() < kMagicSize || std::memcmp(file.data(), "#!AMR\n", kMagicSize) != 0) {
-        error = "missing #!AMR header";
-        return frames;
+    vamrnb_stream_reader *reader = vamrnb_stream_reader_create(nullptr);
+    int32_t st = AMRNB_OK;
+    for (std::size_t pos = 0; st >= 0 && pos < file.size();) {
+        std::size_t used = 0;
+        vamrnb_stream_frame f{};
+        st = vamrnb_stream_read(reader, file.data() + pos, file.size() - pos, &used, &f);
+        pos += used;
+        if (st == VAMRNB_STREAM_FRAME) frames.push_back({static_cast<std::size_t>(f.offset), f.type, f.quality != 0, f.size});
     }
-    std::size_t pos = kMagicSize;
-    while (pos < file.size()) {
-        const int type = (file[pos] >> 3) & 0x0F;
-        const auto size = static_cast<std::size_t>(kStorageSize[type]);
-        if (pos + size > file.size()) {
-            error = "truncated frame at byte " + std::to_string(pos);
-            break;
-        }
-        frames.push_back({pos, type, (file[pos] & 0x04) != 0, size});
-        pos += size;
-    }
+    vamrnb_stream_frame partial{};
+    if (st >= 0) st = vamrnb_stream_finish(reader, &partial);
+    if (st == VAMRNB_STREAM_ERR_TRUNCATED) error = "truncated frame at byte " + std::to_string(partial.offset);
+    else if (st != AMRNB_OK) error = vamrnb_strerror(st);
+    vamrnb_stream_reader_delete(reader);
     return frames;
 }
 

@@ -13,6 +13,8 @@
 #include <string>
 #include <vector>
 
+#include "vamrnb_stream.h"
+
 namespace conformance {
 
 namespace fs = std::filesystem;
@@ -33,9 +35,9 @@ std::vector<fs::path> sorted_entries(const fs::path &dir, bool directories,
                                      const std::string &extension = "");
 
 // Storage format: "#!AMR\n", then per frame a table-of-contents byte and its
-// class bits; the size of a frame in the file depends only on its type.
+// class bits; the size of a frame in the file depends only on its type
+// (vamrnb_stream_frame_size).
 constexpr std::size_t kMagicSize = 6;
-extern const int kStorageSize[16];
 
 struct Frame {
     std::size_t offset;  // of the table-of-contents byte in the file

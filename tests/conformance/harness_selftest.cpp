@@ -26,7 +26,7 @@ TEST(HarnessSelfTest, WalksEveryFrameTypeBySize) {
     const int types[] = {7, 0, 8, 9, 10, 11, 12, 15, 5};
     for (int t : types) {
         file.push_back(static_cast<uint8_t>(t << 3 | 4));
-        file.resize(file.size() + kStorageSize[t] - 1, 0);
+        file.resize(file.size() + vamrnb_stream_frame_size(t) - 1, 0);
     }
     std::string error;
     const auto frames = split_frames(file, error);

@@ -11,11 +11,9 @@
 #include <cstring>
 
 #include "vamrnb.h"
+#include "vamrnb_stream.h"
 
 namespace {
-
-// Bytes a frame of each type occupies, table-of-contents byte included.
-constexpr uint32_t kFrameBytes[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6, 1, 1, 1, 1};
 
 void check(bool ok) {
     if (!ok) std::abort();
@@ -70,7 +68,7 @@ extern "C" int LLVMFuzzerTestOneInput(const uint8_t *data, size_t size) {
         // size: step over the frame as its type says.
         uint32_t step = 1;
         if (st == AMRNB_OK) step = info.bytes;
-        else if (st == AMRNB_ERR_UNSUPPORTED) step = kFrameBytes[(in[pos] >> 3) & 15];
+        else if (st == AMRNB_ERR_UNSUPPORTED) step = vamrnb_stream_frame_size((in[pos] >> 3) & 15);
         pos += step > 0 ? step : 1;
     }
     if (size >= 2) vamrnbd_reset(dec);

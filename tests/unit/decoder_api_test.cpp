@@ -8,11 +8,11 @@
 #include <vector>
 
 #include "vamrnb.h"
+#include "vamrnb_stream.h"
 
 namespace {
 
-// Whole frame sizes in bytes (table-of-contents byte included) by frame type.
-constexpr uint32_t kFrameBytes[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6, 1, 1, 1, 1};
+// Bytes the decoder reports as consumed, by frame type.
 constexpr uint32_t kConsumed[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 1, 0, 0, 1, 1, 1, 1};
 
 using Frame = std::vector<uint8_t>;
@@ -20,7 +20,7 @@ using Frame = std::vector<uint8_t>;
 // A storage-format frame of type ft with pseudo-random payload bits: every
 // bit pattern is a valid frame for the decoder.
 Frame make_frame(int ft, uint32_t &seed, bool good = true) {
-    Frame f(kFrameBytes[ft]);
+    Frame f(vamrnb_stream_frame_size(ft));
     f[0] = static_cast<uint8_t>(ft << 3 | (good ? 4 : 0));
     for (size_t i = 1; i < f.size(); ++i) {
         seed = seed * 1664525u + 1013904223u;
