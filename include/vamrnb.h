@@ -123,7 +123,8 @@ VAMRNB_API void    vamrnbe_delete(vamrnb_encoder *enc);
  * The signal-processing kernels pick vector code for the features the
  * processor has.  vamrnb_set_cpu_flags restricts them to the features in mask
  * (0: portable scalar code only; the default allows all) and returns the
- * previous mask.  Every choice gives the same output bits. */
+ * previous mask.  The x86 levels build on each other: AVX2 code runs only
+ * when SSE4.1 is allowed too.  Every choice gives the same output bits. */
 #define VAMRNB_CPU_SSE41 0x1u
 #define VAMRNB_CPU_AVX2  0x2u
 #define VAMRNB_CPU_NEON  0x4u

@@ -337,24 +337,21 @@ void limit_pitch_gain(int32_t mode, Word16 lsp_flag, const Word16 gp[GP_HIST], W
     }
 }
 
-}  // namespace vamrnb
-
-using namespace vamrnb;
-
-extern "C" {
-
-void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y) {
-    // A vector version with identical results takes over where available.
-    if (const ConvolveFn vec = dsp().convolve) {
-        vec(x, h, y);
-        return;
-    }
+void convolve_c(const Word16 *x, const Word16 *h, Word16 *y) {
     for (int n = 0; n < L_SUBFR; ++n) {
         Word32 s = 0;
         for (int i = 0; i <= n; ++i) s = l_mac(s, x[i], h[n - i]);
         y[n] = extract_h(l_shl(s, 3));
     }
 }
+
+}  // namespace vamrnb
+
+using namespace vamrnb;
+
+extern "C" {
+
+void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y) { dsp().convolve(x, h, y); }
 
 void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t *h,
                             int32_t t_min, int32_t t_max, int16_t *corr) {

@@ -3,6 +3,7 @@
 // FIR of 2 × 10 taps.  Outputs overwrite exc[0..39] in order, so with a delay
 // shorter than the subframe later outputs read earlier ones.
 #include "lpc/dsp.h"
+#include "lpc/enc_kernels.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 
@@ -10,13 +11,8 @@ namespace vamrnb {
 
 void pred_lt_3or6_c(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
     constexpr int kUp = 6;
-    Word32 f = -frac;
-    if (flag3 != 0) f *= 2;            // 1/3 grid onto the 1/6 grid
-    const Word16 *x0 = exc - T0;
-    if (f < 0) {
-        f += kUp;
-        --x0;
-    }
+    Word32 f = 0;
+    const Word16 *x0 = enc_kernel::pred_lt_start(T0, frac, flag3, exc, &f);
     const Word16 *c1 = &vamrnb_tbl_pred_inter_6[f];
     const Word16 *c2 = &vamrnb_tbl_pred_inter_6[kUp - f];
     for (int j = 0; j < L_SUBFR; ++j) {
