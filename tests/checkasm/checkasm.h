@@ -1,0 +1,108 @@
+// checkasm: every vector version of every kernel against its portable
+// version.  For each kernel and each level the processor offers (x86:
+// SSE4.1, then AVX2 on top; ARM: NEON), the version that level newly
+// installs is called on the same random and rail inputs as the portable
+// one; outputs are compared including guard bands before and after every
+// output buffer, so a version that writes past its buffer fails even when
+// the samples it should write are right.
+//
+//   vamrnb_checkasm [--seed=N] [--function=GLOB] [--bench] [--runs=N]
+//
+// --bench prints nanoseconds per call of each version beside the portable
+// one (under an emulator, count instructions instead: the times are the
+// emulator's).
+#pragma once
+
+#include <cstdint>
+#include <cstring>
+#include <functional>
+#include <random>
+#include <string>
+#include <vector>
+
+#include "lpc/dsp.h"
+
+namespace checkasm {
+
+using vamrnb::DspKernels;
+
+// Inputs mixing plain random values, full-scale rails and small values.
+struct Gen {
+    std::mt19937 rng;
+    explicit Gen(uint32_t seed) : rng(seed) {}
+    int16_t sample(int mode);
+    void fill(int16_t *p, int n, int mode) {
+        for (int i = 0; i < n; ++i) p[i] = sample(mode);
+    }
+    int32_t word(int mode);
+    uint32_t below(uint32_t n) { return rng() % n; }
+};
+
+// An output buffer with guard bands: `n` elements between kGuard elements on
+// either side, all pre-filled with one random pattern.  Two buffers built
+// from the same generator state compare equal as a whole only if the
+// versions wrote the same values to the same places.
+template <class T>
+class Buf {
+public:
+    static constexpr int kGuard = 16;
+    Buf(int n, uint32_t pattern) : v_(n + 2 * kGuard) {
+        std::mt19937 r(pattern);
+        for (auto &x : v_) x = static_cast<T>(r());
+    }
+    T *data() { return v_.data() + kGuard; }
+    bool operator==(const Buf &o) const { return v_ == o.v_; }
+    // Copies the first n elements of p into the buffer (inputs that are also
+    // outputs: filter memories, excitation histories).
+    void load(const T *p, int n) { std::memcpy(data(), p, n * sizeof(T)); }
+
+private:
+    std::vector<T> v_;
+};
+
+class Checker {
+public:
+    Checker(uint32_t seed, std::string pattern, bool bench, int runs);
+
+    // Runs `check` for every version of the kernel stored in `member` that a
+    // level newly installs: check(level's function) returns true when its
+    // outputs match the portable version on every input; then, with --bench,
+    // times call(portable) against call(level's function).
+    template <class Fn>
+    void kernel(const char *name, Fn DspKernels::*member, const std::function<bool(Fn)> &check,
+                const std::function<void(Fn)> &call) {
+        for_each_version(name, [&](const DspKernels &k, const DspKernels &below, const char *level) {
+            const Fn fn = k.*member;
+            if (fn == below.*member) return;   // nothing new at this level
+            report(name, level, check(fn));
+            if (bench_) bench(name, level, [&] { call(vamrnb::dsp_for(0).*member); }, [&] { call(fn); });
+        });
+    }
+
+    Gen &gen() { return gen_; }
+    int runs() const { return runs_; }
+    // Notes one failing input (printed with the kernel's result line).
+    bool fail(const std::string &what);
+    int failures() const { return failures_; }
+    bool selected(const char *name) const;
+    // Prints the result line of one kernel at one level (with the notes).
+    void report(const char *name, const char *level, bool ok);
+
+private:
+    void for_each_version(const char *name,
+                          const std::function<void(const DspKernels &, const DspKernels &, const char *)> &each);
+    void bench(const char *name, const char *level, const std::function<void()> &ref,
+               const std::function<void()> &fn);
+
+    Gen gen_;
+    std::string pattern_;
+    bool bench_;
+    int runs_;
+    int failures_ = 0;
+    std::vector<std::string> notes_;
+};
+
+// The kernel checks (kernels.cpp).
+void check_kernels(Checker &c);
+
+}  // namespace checkasm

@@ -1,0 +1,335 @@
+// The kernel checks: one block per kernel, each with the inputs that drive
+// its sums to the rails (full-scale samples, arbitrary filters) beside
+// ordinary ones, the lengths and delays at the edges of each vector path,
+// and the ties that decide the searches.
+#include <string>
+
+#include "checkasm.h"
+#include "lpc/lpc.h"
+#include "lpc/tables.h"
+#include "vamrnb.h"
+
+using namespace vamrnb;
+
+namespace checkasm {
+namespace {
+
+// A stable-ish Q12 filter, or an arbitrary one that drives the sums to the rails.
+void filter(Gen &g, int16_t a[11], int mode) {
+    g.fill(a + 1, 10, mode);
+    if (mode % 3 != 0)
+        for (int i = 1; i <= 10; ++i) a[i] = static_cast<int16_t>(a[i] >> (3 + i / 3));
+    a[0] = mode % 5 == 4 ? g.sample(0) : 4096;
+}
+
+std::string at(const char *what, long v) { return std::string(what) + "=" + std::to_string(v); }
+
+void check_synthesis(Checker &c) {
+    Gen &g = c.gen();
+    int16_t a[11], x[40], mem[10];
+    c.kernel<SynFiltFn>(
+        "syn_filt", &DspKernels::syn_filt,
+        [&](SynFiltFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 4000 * c.runs(); ++t) {
+                filter(g, a, t);
+                g.fill(x, 40, t / 4);
+                g.fill(mem, 10, t / 8);
+                const uint32_t pat = g.rng();
+                Buf<int16_t> ref(40, pat), out(40, pat);
+                syn_filt_c(a, x, mem, ref.data());
+                fn(a, x, mem, out.data());
+                if (!(ref == out)) ok = c.fail(at("t", t));
+            }
+            return ok;
+        },
+        [&](SynFiltFn fn) {
+            int16_t y[40];
+            fn(a, x, mem, y);
+        });
+    int16_t buf[50];
+    Word32 ovf = 0;
+    c.kernel<SynFiltMFn>(
+        "syn_filt_m", &DspKernels::syn_filt_m,
+        [&](SynFiltMFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 4000 * c.runs(); ++t) {
+                filter(g, a, t);
+                g.fill(x, 40, t / 4);
+                g.fill(mem, 10, t / 8);
+                const uint32_t pat = g.rng();
+                Buf<int16_t> ref(50, pat), out(50, pat);
+                ref.load(mem, 10);
+                out.load(mem, 10);
+                Word32 ovf_ref = t & 1, ovf_new = t & 1;
+                syn_filt_m_c(a, x, &ovf_ref, ref.data());
+                fn(a, x, &ovf_new, out.data());
+                if (!(ref == out) || ovf_ref != ovf_new) ok = c.fail(at("t", t));
+            }
+            return ok;
+        },
+        [&](SynFiltMFn fn) { fn(a, x, &ovf, buf); });
+}
+
+void check_residu(Checker &c) {
+    Gen &g = c.gen();
+    int16_t a[11], xb[50];
+    c.kernel<ResiduFn>(
+        "residu", &DspKernels::residu,
+        [&](ResiduFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 4000 * c.runs(); ++t) {
+                filter(g, a, t);
+                if (t % 7 == 0) g.fill(a, 11, 1);   // all rails
+                g.fill(xb, 50, t / 4);
+                const uint32_t pat = g.rng();
+                Buf<int16_t> ref(40, pat), out(40, pat);
+                residu_c(a, xb + 10, ref.data());
+                fn(a, xb + 10, out.data());
+                if (!(ref == out)) ok = c.fail(at("t", t));
+            }
+            return ok;
+        },
+        [&](ResiduFn fn) {
+            int16_t y[40];
+            fn(a, xb + 10, y);
+        });
+}
+
+// Every delay from 1 (outputs reading outputs of the same step) to beyond
+// the longest lag, every fraction on both grids.
+void check_pred_lt(Checker &c) {
+    Gen &g = c.gen();
+    int16_t hist[240];
+    c.kernel<PredLtFn>(
+        "pred_lt_3or6", &DspKernels::pred_lt_3or6,
+        [&](PredLtFn fn) {
+            bool ok = true;
+            int t = 0;
+            for (int run = 0; run < c.runs(); ++run)
+                for (int T0 = 1; T0 <= 150; ++T0)
+                    for (int flag3 = 0; flag3 <= 1; ++flag3)
+                        for (int frac = flag3 ? -1 : -2; frac <= (flag3 ? 1 : 3); ++frac, ++t) {
+                            g.fill(hist, 240, t);
+                            const uint32_t pat = g.rng();
+                            Buf<int16_t> ref(240, pat), out(240, pat);
+                            ref.load(hist, 240);
+                            out.load(hist, 240);
+                            pred_lt_3or6_c(T0, frac, flag3, ref.data() + 200);
+                            fn(T0, frac, flag3, out.data() + 200);
+                            if (!(ref == out))
+                                ok = c.fail(at("T0", T0) + " " + at("frac", frac) + " " + at("flag3", flag3));
+                        }
+            return ok;
+        },
+        [&](PredLtFn fn) { fn(60, 1, 1, hist + 200); });
+}
+
+// Lengths around the eight-sample steps, none, negative; init on the rails.
+void check_sums(Checker &c) {
+    Gen &g = c.gen();
+    const int lengths[] = {40, 160, 8, 1, 0, -3, 5, 39, 41, 159};
+    int16_t x[168], y[168];
+    c.kernel<EnergyFn>(
+        "energy", &DspKernels::energy,
+        [&](EnergyFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 6000 * c.runs(); ++t) {
+                g.fill(x, 168, t);
+                const int n = lengths[t % 10];
+                const int32_t init = g.word(t / 10);
+                if (fn(x, n, init) != energy_c(x, n, init)) ok = c.fail(at("t", t) + " " + at("n", n));
+            }
+            return ok;
+        },
+        [&](EnergyFn fn) { (void)fn(x, 40, 0); });
+    c.kernel<InnerProductFn>(
+        "inner_product", &DspKernels::inner_product,
+        [&](InnerProductFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 6000 * c.runs(); ++t) {
+                g.fill(x, 168, t);
+                g.fill(y, 168, t / 4 + 1);
+                const int n = lengths[t % 10];
+                const int32_t init = g.word(t / 10);
+                if (fn(x, y, n, init) != inner_product_c(x, y, n, init))
+                    ok = c.fail(at("t", t) + " " + at("n", n));
+            }
+            return ok;
+        },
+        [&](InnerProductFn fn) { (void)fn(x, y, 40, 0); });
+}
+
+// Open-loop correlations over both frame lengths and several shortest lags,
+// on full-scale (saturating) and scaled-down (exact-path) signals.
+void check_comp_corr(Checker &c) {
+    Gen &g = c.gen();
+    int16_t sig[143 + 160];
+    c.kernel<CompCorrFn>(
+        "comp_corr", &DspKernels::comp_corr,
+        [&](CompCorrFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 300 * c.runs(); ++t) {
+                g.fill(sig, 303, t % 4 == 1 ? 2 : t);
+                if (t % 3 == 0)
+                    for (auto &v : sig) v = static_cast<int16_t>(v >> 4);
+                const int32_t len = t % 2 ? 160 : 80, lag_min = 18 + t % 5;
+                const uint32_t pat = g.rng();
+                Buf<int32_t> ref(144, pat), out(144, pat);
+                comp_corr_c(sig + 143, len, 143, lag_min, ref.data() + 143);
+                fn(sig + 143, len, 143, lag_min, out.data() + 143);
+                if (!(ref == out)) ok = c.fail(at("t", t));
+            }
+            return ok;
+        },
+        [&](CompCorrFn fn) {
+            int32_t corr[144];
+            fn(sig + 143, 160, 143, 20, corr + 143);
+        });
+}
+
+void check_filters(Checker &c) {
+    Gen &g = c.gen();
+    int16_t x[40], h[40];
+    const auto inputs = [&](int t) {
+        g.fill(x, 40, t);
+        g.fill(h, 40, t / 4 + 2);
+        if (t % 5 == 0) h[0] = 4096;
+    };
+    c.kernel<ConvolveFn>(
+        "convolve", &DspKernels::convolve,
+        [&](ConvolveFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 3000 * c.runs(); ++t) {
+                inputs(t);
+                const uint32_t pat = g.rng();
+                Buf<int16_t> ref(40, pat), out(40, pat);
+                convolve_c(x, h, ref.data());
+                fn(x, h, out.data());
+                if (!(ref == out)) ok = c.fail(at("t", t));
+            }
+            return ok;
+        },
+        [&](ConvolveFn fn) {
+            int16_t y[40];
+            fn(x, h, y);
+        });
+    c.kernel<CorHxFn>(
+        "cor_h_x", &DspKernels::cor_h_x,
+        [&](CorHxFn fn) {
+            bool ok = true;
+            for (int t = 0; t < 3000 * c.runs(); ++t) {
+                inputs(t);
+                const int32_t sf = 1 + t % 2;
+                const uint32_t pat = g.rng();
+                Buf<int16_t> ref(40, pat), out(40, pat);
+                cor_h_x_c(h, x, ref.data(), sf);
+                fn(h, x, out.data(), sf);
+                if (!(ref == out)) ok = c.fail(at("t", t));
+            }
+            return ok;
+        },
+        [&](CorHxFn fn) {
+            int16_t dn[40];
+            fn(h, x, dn, 2);
+        });
+}
+
+// Split-VQ searches: a real codebook, small-valued ones full of ties (equal
+// distances in different lanes, a row and its negation), rails where every
+// distance saturates, and sizes that leave a scalar tail.
+struct VqCase {
+    const int16_t *dico;
+    int size;
+    int16_t r[4], w[4];
+};
+
+VqCase vq_case(Gen &g, std::vector<int16_t> &small, int t) {
+    const int kind = t % 4;
+    const int sizes[] = {64, 128, 256, 512};
+    VqCase v{kind == 0 ? vamrnb_tbl_dico2_lsf : small.data(), kind == 0 ? 256 : kind == 3 ? 4 + 4 * (t % 7) : sizes[t % 4], {}, {}};
+    if (kind != 0)
+        for (auto &s : small) s = kind == 2 ? g.sample(1) : static_cast<int16_t>(static_cast<int>(g.below(5)) - 2);
+    for (int k = 0; k < 4; ++k) {
+        v.r[k] = kind == 2   ? g.sample(1)
+                 : kind == 0 ? static_cast<int16_t>(static_cast<int>(g.below(4001)) - 2000)
+                             : static_cast<int16_t>(static_cast<int>(g.below(7)) - 3);
+        v.w[k] = kind == 2 ? g.sample(t / 4) : static_cast<int16_t>(g.below(9000));
+    }
+    return v;
+}
+
+template <class Fn, class Call>
+void check_vq(Checker &c, const char *name, Fn DspKernels::*member, Fn ref_fn, Call call) {
+    std::vector<int16_t> small(512 * 4);
+    int16_t r[4], w[4] = {4000, 3000, 2000, 1000};
+    c.kernel<Fn>(
+        name, member,
+        [&](Fn fn) {
+            bool ok = true;
+            for (int t = 0; t < 1500 * c.runs(); ++t) {
+                const VqCase v = vq_case(c.gen(), small, t);
+                const uint32_t pat = c.gen().rng();
+                Buf<int16_t> ref(4, pat), out(4, pat);
+                ref.load(v.r, 4);
+                out.load(v.r, 4);
+                const int16_t want = call(ref_fn, ref.data(), v.dico, v.w, v.size);
+                const int16_t got = call(fn, out.data(), v.dico, v.w, v.size);
+                if (want != got || !(ref == out)) ok = c.fail(at("t", t));
+            }
+            return ok;
+        },
+        [&](Fn fn) {
+            std::memcpy(r, vamrnb_tbl_dico2_lsf + 40, sizeof r);
+            (void)call(fn, r, vamrnb_tbl_dico2_lsf, w, 256);
+        });
+}
+
+void check_vq_searches(Checker &c) {
+    check_vq<VqSubvecFn>(c, "vq_subvec", &DspKernels::vq_subvec, vq_subvec_c,
+                         [](VqSubvecFn f, int16_t *r, const int16_t *d, const int16_t *w, int n) {
+                             return f(r, r + 2, d, w, w + 2, n);
+                         });
+    check_vq<VqSubvecFn>(c, "vq_subvec_s", &DspKernels::vq_subvec_s, vq_subvec_s_c,
+                         [](VqSubvecFn f, int16_t *r, const int16_t *d, const int16_t *w, int n) {
+                             return f(r, r + 2, d, w, w + 2, n);
+                         });
+    check_vq<VqSubvec4Fn>(c, "vq_subvec4", &DspKernels::vq_subvec4, vq_subvec4_c,
+                          [](VqSubvec4Fn f, int16_t *r, const int16_t *d, const int16_t *w, int n) {
+                              return f(r, d, w, n);
+                          });
+}
+
+// The allowed-feature mask selects the table of its level for the exported
+// entry points, and every table has every entry.
+void check_dispatch(Checker &c) {
+    if (!c.selected("dispatch")) return;
+    bool ok = true;
+    const uint32_t before = vamrnb_set_cpu_flags(0);
+    for (uint32_t mask = 0; mask < 8; ++mask) {
+        vamrnb_set_cpu_flags(mask);
+        const DspKernels &k = dsp();
+        if (&k != &dsp_for(mask)) ok = c.fail(at("mask", mask));
+        const bool full = k.syn_filt && k.syn_filt_m && k.residu && k.pred_lt_3or6 && k.energy &&
+                          k.inner_product && k.comp_corr && k.convolve && k.vq_subvec && k.vq_subvec_s &&
+                          k.vq_subvec4 && k.cor_h_x;
+        if (!full) ok = c.fail(at("empty entry at mask", mask));
+    }
+    vamrnb_set_cpu_flags(before);
+    c.report("dispatch", "all", ok);
+}
+
+}  // namespace
+
+void check_kernels(Checker &c) {
+    check_dispatch(c);
+    check_synthesis(c);
+    check_residu(c);
+    check_pred_lt(c);
+    check_sums(c);
+    check_comp_corr(c);
+    check_filters(c);
+    check_vq_searches(c);
+}
+
+}  // namespace checkasm
