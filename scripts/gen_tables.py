@@ -6,7 +6,8 @@ table files (one file per table: five '#' header lines, then the values).
 
 TABLE_DIR defaults to ../shared/tables beside the project.  Writes
 src/format/frame_tables.{h,cpp} (frame-format and homing tables) and
-src/lpc/tables.{h,cpp} (every other table).  The generated files are committed
+src/basic_op/op_tables.{h,cpp} (interpolation tables of the extended
+operators) and src/lpc/tables.{h,cpp} (every other table).  The generated files are committed
 so that a checkout builds without the table files.
 """
 import os
@@ -51,6 +52,10 @@ FORMAT_STEMS = (
     | {"sort_" + s for s in SORT}
     | {"dhf_" + m for m in MODES}
 )
+# Interpolation tables of log2, pow2, 1/sqrt and sqrt: read by the extended
+# operators only, so generated beside them (nothing in src/basic_op may
+# include from the folders above it).
+OP_STEMS = {"log2_table", "pow2_table", "inv_sqrt_table", "sqrt_l_table"}
 # Values given only in the library's own format description (no table file).
 IF2 = {
     "vamrnb_tbl_packed_size_IF2": [12, 13, 15, 17, 18, 20, 25, 30, 5, 0, 0, 0, 0, 0, 0, 0],
@@ -187,7 +192,8 @@ def readers(name, internal):
         for f in files:
             path = os.path.join(d, f)
             rel = os.path.relpath(path, os.path.join(ROOT, "src"))
-            if rel in ("lpc/tables.cpp", "lpc/tables.h", "format/frame_tables.cpp", "format/frame_tables.h"):
+            if rel in ("lpc/tables.cpp", "lpc/tables.h", "format/frame_tables.cpp", "format/frame_tables.h",
+                       "basic_op/op_tables.cpp", "basic_op/op_tables.h"):
                 continue
             with open(path) as fh:
                 if pat.search(fh.read()):
@@ -240,11 +246,11 @@ def main():
     def ctype(head):
         return "uint8_t" if head.get("type") == "uint8" else "int16_t"
 
-    out = {"format": ([], [], [], []), "lpc": ([], [], [], [])}  # (c decls, c defs, cpp decls, cpp defs)
+    out = {"format": ([], [], [], []), "op": ([], [], [], []), "lpc": ([], [], [], [])}  # (c decls, c defs, cpp decls, cpp defs)
     exported = []  # (group, declaration) of every table the library exports
     for s in stems:
         head, vals = tables[s]
-        group = "format" if s in FORMAT_STEMS else "lpc"
+        group = "format" if s in FORMAT_STEMS else "op" if s in OP_STEMS else "lpc"
         cdecl, cdef, pdecl, pdef = out[group]
         t = ctype(head)
         n = len(vals)
@@ -293,16 +299,16 @@ def main():
         # The public header declares the exported tables with default
         # visibility; including it here gives the definitions that visibility.
         pub = f"#include \"{public_header}\"\n" if public_header else ""
+        cblock = ("extern \"C\" {\n" + "\n".join(cdecl) + "\n}\n\n") if cdecl else ""
         guard_h = (f"{banner}// {purpose}\n#pragma once\n\n#include <cstdint>\n\n{pub}"
-                   + ("\n" if pub else "") +
-                   "extern \"C\" {\n" + "\n".join(cdecl) + "\n}\n\n"
+                   + ("\n" if pub else "") + cblock +
                    "namespace vamrnb::tab {\n" + "\n".join(pdecl) + "\n}  // namespace vamrnb::tab\n")
         with open(os.path.join(ROOT, path_h), "w") as f:
             f.write(guard_h)
         inc = os.path.relpath(os.path.join(ROOT, path_h), os.path.join(ROOT, "src"))
         body = (f"{banner}// {purpose}\n#include \"{inc}\"\n\n"
-                "namespace vamrnb::tab {\n\n" + "\n".join(pdef) + "\n}  // namespace vamrnb::tab\n\n"
-                "extern \"C\" {\n\n" + "\n".join(cdef) + "\n}\n")
+                "namespace vamrnb::tab {\n\n" + "\n".join(pdef) + "\n}  // namespace vamrnb::tab\n"
+                + (("\nextern \"C\" {\n\n" + "\n".join(cdef) + "\n}\n") if cdef else ""))
         with open(os.path.join(ROOT, path_cpp), "w") as f:
             f.write(body)
 
@@ -321,6 +327,8 @@ def main():
     write("format", "src/format/frame_tables.h", "src/format/frame_tables.cpp",
           "Frame-format tables: sizes, parameter widths, bit order, homing frames.",
           public_header="vamrnb_tables.h")
+    write("op", "src/basic_op/op_tables.h", "src/basic_op/op_tables.cpp",
+          "Interpolation tables of the extended operators: log2, pow2, 1/sqrt, sqrt.")
     write("lpc", "src/lpc/tables.h", "src/lpc/tables.cpp",
           "Codec constant tables: windows, codebooks, gains, filters, detector tables.",
           public_header="vamrnb_tables.h")

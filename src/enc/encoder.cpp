@@ -4,7 +4,7 @@
 // frame type and packing the frame, and releasing the instance.
 #include <cstring>
 
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "enc/subframe.h"
 #include "common/bitstream.h"
 #include "format/frame_format.h"

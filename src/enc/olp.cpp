@@ -6,7 +6,7 @@
 // tone, pitch and high-pass correlation flags for the sub-band detector,
 // summed correlation and energy with the long-term-prediction flag for the
 // spectral detector.
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "basic_op/ext_op.h"
 #include "lpc/dsp.h"
 #include "lpc/tables.h"

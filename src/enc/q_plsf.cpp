@@ -4,7 +4,7 @@
 // weighted residual is matched against three codebooks.  The search kernels
 // here also serve the two-vector split-matrix quantiser that the LP analysis
 // runs inline for MR122.
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "lpc/dsp.h"
 #include "lpc/tables.h"
 

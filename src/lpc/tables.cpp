@@ -150,16 +150,6 @@ const int16_t inter_36_inter_6[25] = {
     0,
 };
 
-// inv_sqrt_table [49]: 1/sqrt(x) at 49 points, interpolated between neighbours.
-// Read by basic_op/ext_op.cpp.
-const int16_t inv_sqrt_table[49] = {
-    32767, 31790, 30894, 30070, 29309, 28602, 27945, 27330, 26755, 26214, 25705, 25225,
-    24770, 24339, 23930, 23541, 23170, 22817, 22479, 22155, 21845, 21548, 21263, 20988,
-    20724, 20470, 20225, 19988, 19760, 19539, 19326, 19119, 18919, 18725, 18536, 18354,
-    18176, 18004, 17837, 17674, 17515, 17361, 17211, 17064, 16921, 16782, 16646, 16514,
-    16384,
-};
-
 // lag_h [10]: autocorrelation lag window for lags 1..10: high halves of the double-precision
 // values.
 // Read by enc/lpc_analysis.cpp.
@@ -172,14 +162,6 @@ const int16_t lag_h[10] = {
 // Read by enc/lpc_analysis.cpp.
 const int16_t lag_l[10] = {
     11904, 17280, 30720, 25856, 24192, 28992, 24384, 7360, 19520, 14784,
-};
-
-// log2_table [33]: log2(x) at 33 points, Q15, interpolated between neighbours.
-// Read by basic_op/ext_op.cpp.
-const int16_t log2_table[33] = {
-    0, 1455, 2866, 4236, 5568, 6863, 8124, 9352, 10549, 11716, 12855, 13967,
-    15054, 16117, 17156, 18172, 19167, 20142, 21097, 22033, 22951, 23852, 24735, 25603,
-    26455, 27291, 28113, 28922, 29716, 30497, 31266, 32023, 32767,
 };
 
 // lsf_hist_mean_scale [10]: comfort-noise decoder: how far each LSF may vary around its mean,
@@ -482,14 +464,6 @@ const int16_t post_pro_a[3] = {
 // Read by dec/post_filt.cpp.
 const int16_t post_pro_b[3] = {
     7699, -15398, 7699,
-};
-
-// pow2_table [33]: 2^x at 33 points, interpolated between neighbours.
-// Read by basic_op/ext_op.cpp.
-const int16_t pow2_table[33] = {
-    16384, 16743, 17109, 17484, 17867, 18258, 18658, 19066, 19484, 19911, 20347, 20792,
-    21247, 21713, 22188, 22674, 23170, 23678, 24196, 24726, 25268, 25821, 26386, 26964,
-    27554, 28158, 28774, 29405, 30048, 30706, 31379, 32066, 32767,
 };
 
 // pre_proc_a [3]: encoder input high-pass (about 80 Hz), feedback coefficients, Q12 (the first
@@ -922,16 +896,6 @@ const int16_t slope[64] = {
     -668, -677, -687, -699, -713, -730, -750, -772, -797, -827, -861, -901,
     -946, -998, -1059, -1132, -1219, -1322, -1450, -1608, -1811, -2081, -2444, -2979,
     -3813, -5323, -8812, -26887,
-};
-
-// sqrt_l_table [49]: sqrt(x) at 49 points, interpolated between neighbours.
-// Read by basic_op/ext_op.cpp.
-const int16_t sqrt_l_table[49] = {
-    16384, 16888, 17378, 17854, 18318, 18770, 19212, 19644, 20066, 20480, 20886, 21283,
-    21674, 22058, 22435, 22806, 23170, 23530, 23884, 24232, 24576, 24915, 25249, 25580,
-    25905, 26227, 26545, 26859, 27170, 27477, 27780, 28081, 28378, 28672, 28963, 29251,
-    29537, 29819, 30099, 30377, 30652, 30924, 31194, 31462, 31727, 31991, 32252, 32511,
-    32767,
 };
 
 // startPos [2x8]: MR475/MR515: start position of each pulse, index 8·track + 2·subframe +
