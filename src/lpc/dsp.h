@@ -61,20 +61,26 @@ const DspKernels &dsp_for(uint32_t flags);
 // Features of this processor that the build has vector code for.
 uint32_t cpu_detect();
 
-// ---- portable versions, each defined beside the stage that owns it -----------
-void syn_filt_c(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
-void syn_filt_m_c(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
-void residu_c(const Word16 *a, const Word16 *x, Word16 *y);
-void pred_lt_3or6_c(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-Word32 energy_c(const Word16 *x, Word32 n, Word32 init);
-Word32 inner_product_c(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
-void comp_corr_c(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
-void convolve_c(const Word16 *x, const Word16 *h, Word16 *y);
-int16_t vq_subvec_c(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1, const Word16 *w2,
-                    Word32 size);
-int16_t vq_subvec_s_c(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                      const Word16 *w2, Word32 size);
-int16_t vq_subvec4_c(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
-void cor_h_x_c(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
+// Declares one version of every kernel, named <kernel>_<suffix>.  Each
+// architecture header declares its levels with it and installs, in its init
+// function, the versions it defines; the others are never referenced.
+#define VAMRNB_DECL_KERNELS(sfx)                                                                   \
+    void syn_filt_##sfx(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);           \
+    void syn_filt_m_##sfx(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);        \
+    void residu_##sfx(const Word16 *a, const Word16 *x, Word16 *y);                                \
+    void pred_lt_3or6_##sfx(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);                    \
+    Word32 energy_##sfx(const Word16 *x, Word32 n, Word32 init);                                   \
+    Word32 inner_product_##sfx(const Word16 *x, const Word16 *y, Word32 n, Word32 init);           \
+    void comp_corr_##sfx(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr); \
+    void convolve_##sfx(const Word16 *x, const Word16 *h, Word16 *y);                              \
+    int16_t vq_subvec_##sfx(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,          \
+                            const Word16 *w2, Word32 size);                                        \
+    int16_t vq_subvec_s_##sfx(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,        \
+                              const Word16 *w2, Word32 size);                                      \
+    int16_t vq_subvec4_##sfx(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);         \
+    void cor_h_x_##sfx(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
+
+// The portable versions, each defined beside the stage that owns it.
+VAMRNB_DECL_KERNELS(c)
 
 }  // namespace vamrnb

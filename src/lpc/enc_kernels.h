@@ -13,6 +13,7 @@
 #include <cstdint>
 
 #include "basic_op/basic_op.h"
+#include "lpc/tables.h"
 
 namespace vamrnb::enc_kernel {
 
@@ -83,9 +84,10 @@ inline void comp_corr(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_mi
 // ---- fractional delay -------------------------------------------------------
 // Start of the interpolation for delay T0 and fraction frac (1/3 grid when
 // flag3 is set, 1/6 otherwise): returns the past sample the first output is
-// centred on and sets *phase to the fraction on the 1/6 grid, 0..5.
-inline const Word16 *pred_lt_start(Word32 T0, Word32 frac, Word32 flag3, const Word16 *exc,
-                                   Word32 *phase) {
+// centred on, and gives the ten taps applied backwards from it (c1) and the
+// ten applied forwards from the sample after it (c2), Q15.
+inline const Word16 *pred_lt_taps(Word32 T0, Word32 frac, Word32 flag3, const Word16 *exc, Word16 c1[10],
+                                  Word16 c2[10]) {
     Word32 f = -frac;
     if (flag3 != 0) f *= 2;   // 1/3 grid onto the 1/6 grid
     const Word16 *x0 = exc - T0;
@@ -93,7 +95,10 @@ inline const Word16 *pred_lt_start(Word32 T0, Word32 frac, Word32 flag3, const W
         f += 6;
         --x0;
     }
-    *phase = f;
+    for (int i = 0; i < 10; ++i) {
+        c1[i] = vamrnb_tbl_pred_inter_6[f + 6 * i];
+        c2[i] = vamrnb_tbl_pred_inter_6[6 - f + 6 * i];
+    }
     return x0;
 }
 

@@ -1,6 +1,6 @@
 // The ARM kernel levels: declarations of the NEON versions (32-bit ARM with
 // NEON and AArch64 alike) and the init function that installs them over the
-// portable table.  Included by dsp.cpp and checkasm only.
+// portable table.  Included by dsp.cpp and the NEON kernel file.
 #pragma once
 
 #include "lpc/dsp.h"
@@ -10,20 +10,7 @@
 
 namespace vamrnb {
 
-void syn_filt_neon(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
-void syn_filt_m_neon(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
-void residu_neon(const Word16 *a, const Word16 *x, Word16 *y);
-void pred_lt_3or6_neon(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-Word32 energy_neon(const Word16 *x, Word32 n, Word32 init);
-Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
-void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
-void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y);
-int16_t vq_subvec_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                       const Word16 *w2, Word32 size);
-int16_t vq_subvec_s_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                         const Word16 *w2, Word32 size);
-int16_t vq_subvec4_neon(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
-void cor_h_x_neon(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
+VAMRNB_DECL_KERNELS(neon)
 
 inline void dsp_init_arm(DspKernels &c, uint32_t flags) {
     if (!(flags & kCpuNeon)) return;

@@ -35,12 +35,7 @@ inline void syn_run(const Word16 *a, const Word16 *x, Word16 *buf, Word32 *overf
         for (int i = 1; i <= M; ++i) s = vmlsq_s32(s, coef[i], vmovl_s16(vld1_s16(y - i)));
         int32_t p[4];
         vst1q_s32(p, s);
-        y[0] = Rule::out(p[0], overflow);
-        y[1] = Rule::out(wrap_sub(p[1], wrap_mul(a[1], y[0])), overflow);
-        y[2] = Rule::out(wrap_sub(p[2], wrap_add(wrap_mul(a[1], y[1]), wrap_mul(a[2], y[0]))), overflow);
-        y[3] = Rule::out(wrap_sub(p[3], wrap_add(wrap_add(wrap_mul(a[1], y[2]), wrap_mul(a[2], y[1])),
-                                                 wrap_mul(a[3], y[0]))),
-                         overflow);
+        syn::finish4<Rule>(a, p, y, overflow);
     }
 }
 
@@ -80,13 +75,8 @@ void pred_lt_3or6_neon(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
         pred_lt_3or6_c(T0, frac, flag3, exc);
         return;
     }
-    Word32 f = 0;
-    const Word16 *x0 = enc_kernel::pred_lt_start(T0, frac, flag3, exc, &f);
     Word16 c1[10], c2[10];
-    for (int i = 0; i < 10; ++i) {
-        c1[i] = vamrnb_tbl_pred_inter_6[f + 6 * i];
-        c2[i] = vamrnb_tbl_pred_inter_6[6 - f + 6 * i];
-    }
+    const Word16 *x0 = enc_kernel::pred_lt_taps(T0, frac, flag3, exc, c1, c2);
     const int step = T0 >= 18 ? 8 : 4;
     for (int j = 0; j < L_SUBFR; j += step) {
         int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);

@@ -1,6 +1,6 @@
 // The x86 kernel levels: declarations of the SSE4.1 and AVX2 versions and the
 // init function that installs them over the portable table, one level after
-// the other.  Included by dsp.cpp and checkasm only.
+// the other.  Included by dsp.cpp and the x86 kernel files.
 #pragma once
 
 #include "lpc/dsp.h"
@@ -10,25 +10,8 @@
 
 namespace vamrnb {
 
-void syn_filt_m_sse41(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
-void residu_sse41(const Word16 *a, const Word16 *x, Word16 *y);
-void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init);
-Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
-void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
-void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y);
-int16_t vq_subvec_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                        const Word16 *w2, Word32 size);
-int16_t vq_subvec_s_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                          const Word16 *w2, Word32 size);
-int16_t vq_subvec4_sse41(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
-void cor_h_x_sse41(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
-
-void residu_avx2(const Word16 *a, const Word16 *x, Word16 *y);
-void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-void comp_corr_avx2(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
-void convolve_avx2(const Word16 *x, const Word16 *h, Word16 *y);
-void cor_h_x_avx2(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
+VAMRNB_DECL_KERNELS(sse41)
+VAMRNB_DECL_KERNELS(avx2)
 
 // The plain synthesis keeps its portable version at every level: its
 // critical path is the output-to-output chain, which vectors do not shorten.

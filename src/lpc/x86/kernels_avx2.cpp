@@ -31,12 +31,12 @@ VAMRNB_AVX2 void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 
         pred_lt_3or6_c(T0, frac, flag3, exc);
         return;
     }
-    Word32 f = 0;
-    const Word16 *x0 = enc_kernel::pred_lt_start(T0, frac, flag3, exc, &f);
+    Word16 t1[10], t2[10];
+    const Word16 *x0 = enc_kernel::pred_lt_taps(T0, frac, flag3, exc, t1, t2);
     __m256i c1[10], c2[10];
     for (int i = 0; i < 10; ++i) {
-        c1[i] = _mm256_set1_epi32(vamrnb_tbl_pred_inter_6[f + 6 * i]);
-        c2[i] = _mm256_set1_epi32(vamrnb_tbl_pred_inter_6[6 - f + 6 * i]);
+        c1[i] = _mm256_set1_epi32(t1[i]);
+        c2[i] = _mm256_set1_epi32(t2[i]);
     }
     for (int j = 0; j < L_SUBFR; j += 8) {
         __m256i s = _mm256_setzero_si256();

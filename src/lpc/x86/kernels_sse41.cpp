@@ -56,12 +56,7 @@ VAMRNB_SSE41 inline void syn_run(const Word16 *a, const Word16 *x, Word16 *buf, 
         s = _mm_sub_epi32(s, acc);
         alignas(16) Word32 p[4];
         _mm_store_si128(reinterpret_cast<__m128i *>(p), s);
-        y[0] = Rule::out(p[0], overflow);
-        y[1] = Rule::out(wrap_sub(p[1], wrap_mul(a[1], y[0])), overflow);
-        y[2] = Rule::out(wrap_sub(p[2], wrap_add(wrap_mul(a[1], y[1]), wrap_mul(a[2], y[0]))), overflow);
-        y[3] = Rule::out(wrap_sub(p[3], wrap_add(wrap_add(wrap_mul(a[1], y[2]), wrap_mul(a[2], y[1])),
-                                                 wrap_mul(a[3], y[0]))),
-                         overflow);
+        syn::finish4<Rule>(a, p, y, overflow);
     }
 }
 
@@ -97,12 +92,12 @@ VAMRNB_SSE41 void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word1
         pred_lt_3or6_c(T0, frac, flag3, exc);
         return;
     }
-    Word32 f = 0;
-    const Word16 *x0 = enc_kernel::pred_lt_start(T0, frac, flag3, exc, &f);
+    Word16 t1[10], t2[10];
+    const Word16 *x0 = enc_kernel::pred_lt_taps(T0, frac, flag3, exc, t1, t2);
     __m128i c1[10], c2[10];
     for (int i = 0; i < 10; ++i) {
-        c1[i] = _mm_set1_epi32(vamrnb_tbl_pred_inter_6[f + 6 * i]);
-        c2[i] = _mm_set1_epi32(vamrnb_tbl_pred_inter_6[6 - f + 6 * i]);
+        c1[i] = _mm_set1_epi32(t1[i]);
+        c2[i] = _mm_set1_epi32(t2[i]);
     }
     for (int j = 0; j < L_SUBFR; j += 4) {
         __m128i s = _mm_setzero_si128();
