@@ -60,6 +60,23 @@ private:
     std::vector<T> v_;
 };
 
+// Calls run(out) once for the portable version and once for the new one,
+// each on a guarded buffer of n elements whose first n_in elements are
+// copied from `in` (filter memories, excitation histories), and compares the
+// two buffers as a whole.  `run(out, ref)` picks the version by `ref`.
+template <class T, class Run>
+bool same_output(Gen &g, int n, const T *in, int n_in, Run run) {
+    const uint32_t pat = g.rng();
+    Buf<T> ref(n, pat), out(n, pat);
+    if (n_in > 0) {
+        ref.load(in, n_in);
+        out.load(in, n_in);
+    }
+    const auto want = run(ref.data(), true);
+    const auto got = run(out.data(), false);
+    return want == got && ref == out;
+}
+
 class Checker {
 public:
     Checker(uint32_t seed, std::string pattern, bool bench, int runs);
