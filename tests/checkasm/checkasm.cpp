@@ -115,6 +115,8 @@ int main(int argc, char **argv) {
     std::string pattern;
     bool bench = false;
     int runs = 1;
+    long calls = -1;
+    bool version_new = false;
     for (int i = 1; i < argc; ++i) {
         const std::string a = argv[i];
         if (a.rfind("--seed=", 0) == 0) {
@@ -123,6 +125,10 @@ int main(int argc, char **argv) {
             pattern = a.substr(11);
         } else if (a == "--bench") {
             bench = true;
+        } else if (a.rfind("--calls=", 0) == 0) {
+            calls = std::atol(a.c_str() + 8);
+        } else if (a == "--version=c" || a == "--version=new") {
+            version_new = a == "--version=new";
         } else if (a.rfind("--runs=", 0) == 0) {
             runs = std::atoi(a.c_str() + 7);
         } else {
@@ -131,7 +137,9 @@ int main(int argc, char **argv) {
                          "  --seed=N        random inputs from seed N (default: from the clock)\n"
                          "  --function=GLOB only the kernels whose names match (e.g. 'vq_*')\n"
                          "  --bench         time each version against the portable one\n"
-                         "  --runs=N        N times the default number of random inputs\n",
+                         "  --runs=N        N times the default number of random inputs\n"
+                         "  --calls=N       no checks: N calls of one version of each kernel\n"
+                         "  --version=c|new the version --calls makes (default: c)\n",
                          argv[0]);
             return 2;
         }
@@ -139,6 +147,11 @@ int main(int argc, char **argv) {
     if (runs < 1) runs = 1;
     std::printf("checkasm: seed %u, processor features 0x%x\n", seed, vamrnb::cpu_detect());
     checkasm::Checker c(seed, pattern, bench, runs);
+    if (calls >= 0) {
+        c.count_calls(calls, version_new);
+        checkasm::check_kernels(c);
+        return 0;
+    }
     checkasm::check_kernels(c);
     if (c.failures() != 0) {
         std::printf("checkasm: %d FAILED (seed %u)\n", c.failures(), seed);

@@ -7,10 +7,14 @@
 // the samples it should write are right.
 //
 //   vamrnb_checkasm [--seed=N] [--function=GLOB] [--bench] [--runs=N]
+//                   [--calls=N --version=c|new]
 //
 // --bench prints nanoseconds per call of each version beside the portable
-// one (under an emulator, count instructions instead: the times are the
-// emulator's).
+// one.  Under an emulator the times are the emulator's; count instructions
+// instead: --calls=N --version=c (or new) skips the checks and makes exactly
+// N calls of that version of each selected kernel, so that the difference
+// between the emulator's instruction counts for N and for 0 calls, divided
+// by N, is the cost of one call (scripts/checkasm_count.sh).
 #pragma once
 
 #include <cstdint>
@@ -80,6 +84,12 @@ bool same_output(Gen &g, int n, const T *in, int n_in, Run run) {
 class Checker {
 public:
     Checker(uint32_t seed, std::string pattern, bool bench, int runs);
+    // Call-counting mode (see the file comment); version_new: the level's
+    // version rather than the portable one.
+    void count_calls(long calls, bool version_new) {
+        calls_ = calls;
+        version_new_ = version_new;
+    }
 
     // Runs `check` for every version of the kernel stored in `member` that a
     // level newly installs: check(level's function) returns true when its
@@ -91,13 +101,20 @@ public:
         for_each_version(name, [&](const DspKernels &k, const DspKernels &below, const char *level) {
             const Fn fn = k.*member;
             if (fn == below.*member) return;   // nothing new at this level
+            if (calls_ >= 0) {
+                (void)check(fn);
+                for (long i = 0; i < calls_; ++i) call(version_new_ ? fn : vamrnb::dsp_for(0).*member);
+                return;
+            }
             report(name, level, check(fn));
             if (bench_) bench(name, level, [&] { call(vamrnb::dsp_for(0).*member); }, [&] { call(fn); });
         });
     }
 
     Gen &gen() { return gen_; }
-    int runs() const { return runs_; }
+    // How many rounds of random inputs each check makes (none when only
+    // counting calls: the inputs then stay zero).
+    int runs() const { return calls_ >= 0 ? 0 : runs_; }
     // Notes one failing input (printed with the kernel's result line).
     bool fail(const std::string &what);
     int failures() const { return failures_; }
@@ -116,6 +133,8 @@ private:
     bool bench_;
     int runs_;
     int failures_ = 0;
+    long calls_ = -1;
+    bool version_new_ = false;
     std::vector<std::string> notes_;
 };
 

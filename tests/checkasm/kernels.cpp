@@ -26,7 +26,7 @@ std::string at(const char *what, long v) { return std::string(what) + "=" + std:
 
 void check_synthesis(Checker &c) {
     Gen &g = c.gen();
-    int16_t a[11], x[40], mem[10], buf[50];
+    int16_t a[11] = {}, x[40] = {}, mem[10] = {}, buf[50] = {};
     Word32 ovf = 0;
     const auto inputs = [&](int t) {
         filter(g, a, t);
@@ -42,6 +42,9 @@ void check_synthesis(Checker &c) {
                 const auto run = [&](int16_t *out, bool ref) { return (ref ? syn_filt_c : fn)(a, x, mem, out), 0; };
                 if (!same_output<int16_t>(g, 40, nullptr, 0, run)) ok = c.fail(at("t", t));
             }
+            filter(g, a, 1);
+            g.fill(x, 40, 2);
+            g.fill(mem, 10, 2);   // ordinary inputs for --bench
             return ok;
         },
         [&](SynFiltFn fn) { fn(a, x, mem, buf); });
@@ -59,6 +62,9 @@ void check_synthesis(Checker &c) {
                 };
                 if (!same_output<int16_t>(g, 50, mem, 10, run)) ok = c.fail(at("t", t));
             }
+            filter(g, a, 1);
+            g.fill(x, 40, 2);
+            g.fill(mem, 10, 2);   // ordinary inputs for --bench
             return ok;
         },
         [&](SynFiltMFn fn) { fn(a, x, &ovf, buf); });
@@ -66,7 +72,7 @@ void check_synthesis(Checker &c) {
 
 void check_residu(Checker &c) {
     Gen &g = c.gen();
-    int16_t a[11], xb[50], y[40];
+    int16_t a[11] = {}, xb[50] = {}, y[40];
     c.kernel<ResiduFn>(
         "residu", &DspKernels::residu,
         [&](ResiduFn fn) {
@@ -78,6 +84,8 @@ void check_residu(Checker &c) {
                 const auto run = [&](int16_t *out, bool ref) { return (ref ? residu_c : fn)(a, xb + 10, out), 0; };
                 if (!same_output<int16_t>(g, 40, nullptr, 0, run)) ok = c.fail(at("t", t));
             }
+            filter(g, a, 1);
+            g.fill(xb, 50, 2);   // ordinary inputs for --bench
             return ok;
         },
         [&](ResiduFn fn) { fn(a, xb + 10, y); });
@@ -87,7 +95,7 @@ void check_residu(Checker &c) {
 // the longest lag, every fraction on both grids.
 void check_pred_lt(Checker &c) {
     Gen &g = c.gen();
-    int16_t hist[240];
+    int16_t hist[240] = {};
     c.kernel<PredLtFn>(
         "pred_lt_3or6", &DspKernels::pred_lt_3or6,
         [&](PredLtFn fn) {
@@ -104,6 +112,7 @@ void check_pred_lt(Checker &c) {
                             if (!same_output<int16_t>(g, 240, hist, 240, run))
                                 ok = c.fail(at("T0", T0) + " " + at("frac", frac) + " " + at("flag3", flag3));
                         }
+            g.fill(hist, 240, 2);   // ordinary inputs for --bench
             return ok;
         },
         [&](PredLtFn fn) { fn(60, 1, 1, hist + 200); });
@@ -113,7 +122,7 @@ void check_pred_lt(Checker &c) {
 void check_sums(Checker &c) {
     Gen &g = c.gen();
     const int lengths[] = {40, 160, 8, 1, 0, -3, 5, 39, 41, 159};
-    int16_t x[168], y[168];
+    int16_t x[168] = {}, y[168] = {};
     c.kernel<EnergyFn>(
         "energy", &DspKernels::energy,
         [&](EnergyFn fn) {
@@ -124,6 +133,7 @@ void check_sums(Checker &c) {
                 const int32_t init = g.word(t / 10);
                 if (fn(x, n, init) != energy_c(x, n, init)) ok = c.fail(at("t", t) + " " + at("n", n));
             }
+            g.fill(x, 168, 2);   // ordinary inputs for --bench
             return ok;
         },
         [&](EnergyFn fn) { (void)fn(x, 40, 0); });
@@ -139,6 +149,8 @@ void check_sums(Checker &c) {
                 if (fn(x, y, n, init) != inner_product_c(x, y, n, init))
                     ok = c.fail(at("t", t) + " " + at("n", n));
             }
+            g.fill(x, 168, 2);
+            g.fill(y, 168, 2);   // ordinary inputs for --bench
             return ok;
         },
         [&](InnerProductFn fn) { (void)fn(x, y, 40, 0); });
@@ -148,7 +160,7 @@ void check_sums(Checker &c) {
 // on full-scale (saturating) and scaled-down (exact-path) signals.
 void check_comp_corr(Checker &c) {
     Gen &g = c.gen();
-    int16_t sig[143 + 160];
+    int16_t sig[143 + 160] = {};
     c.kernel<CompCorrFn>(
         "comp_corr", &DspKernels::comp_corr,
         [&](CompCorrFn fn) {
@@ -163,6 +175,7 @@ void check_comp_corr(Checker &c) {
                 };
                 if (!same_output<int32_t>(g, 144, nullptr, 0, run)) ok = c.fail(at("t", t));
             }
+            g.fill(sig, 303, 2);   // ordinary inputs for --bench
             return ok;
         },
         [&](CompCorrFn fn) {
@@ -173,11 +186,16 @@ void check_comp_corr(Checker &c) {
 
 void check_filters(Checker &c) {
     Gen &g = c.gen();
-    int16_t x[40], h[40];
+    int16_t x[40] = {}, h[40] = {};
     const auto inputs = [&](int t) {
         g.fill(x, 40, t);
         g.fill(h, 40, t / 4 + 2);
         if (t % 5 == 0) h[0] = 4096;
+    };
+    const auto typical = [&] {
+        g.fill(x, 40, 2);
+        g.fill(h, 40, 2);
+        h[0] = 4096;
     };
     c.kernel<ConvolveFn>(
         "convolve", &DspKernels::convolve,
@@ -188,6 +206,7 @@ void check_filters(Checker &c) {
                 const auto run = [&](int16_t *out, bool ref) { return (ref ? convolve_c : fn)(x, h, out), 0; };
                 if (!same_output<int16_t>(g, 40, nullptr, 0, run)) ok = c.fail(at("t", t));
             }
+            typical();   // ordinary inputs for --bench
             return ok;
         },
         [&](ConvolveFn fn) {
@@ -204,6 +223,7 @@ void check_filters(Checker &c) {
                 const auto run = [&](int16_t *out, bool ref) { return (ref ? cor_h_x_c : fn)(h, x, out, sf), 0; };
                 if (!same_output<int16_t>(g, 40, nullptr, 0, run)) ok = c.fail(at("t", t));
             }
+            typical();   // ordinary inputs for --bench
             return ok;
         },
         [&](CorHxFn fn) {
