@@ -68,20 +68,21 @@ constexpr Word16 saturate(Word32 L VAMRNB_SITE) {
     return sat16_32(L);
 }
 // A 32-bit overflow of a ± b can only happen far outside 16 bits, on the side
-// of a's sign; otherwise the 32-bit result is clamped.
+// of a's sign; otherwise the 32-bit result s is clamped.
+constexpr Word16 narrow16(Word32 a, Word32 s, bool wide, [[maybe_unused]] const char *op VAMRNB_SITE_PARAM) {
+    VAMRNB_SATURATED(wide || s > MAX_16 || s < MIN_16, op);
+    if (wide) return a < 0 ? MIN_16 : MAX_16;
+    return sat16_32(s);
+}
 constexpr Word16 add(Word32 a, Word32 b VAMRNB_SITE) {
     Word32 s = 0;
     const bool wide = __builtin_add_overflow(a, b, &s);
-    VAMRNB_SATURATED(wide || s > MAX_16 || s < MIN_16, "add");
-    if (wide) return a < 0 ? MIN_16 : MAX_16;
-    return sat16_32(s);
+    return narrow16(a, s, wide, "add" VAMRNB_SITE_ARG);
 }
 constexpr Word16 sub(Word32 a, Word32 b VAMRNB_SITE) {
     Word32 s = 0;
     const bool wide = __builtin_sub_overflow(a, b, &s);
-    VAMRNB_SATURATED(wide || s > MAX_16 || s < MIN_16, "sub");
-    if (wide) return a < 0 ? MIN_16 : MAX_16;
-    return sat16_32(s);
+    return narrow16(a, s, wide, "sub" VAMRNB_SITE_ARG);
 }
 
 constexpr Word16 abs_s(Word16 a VAMRNB_SITE) {
@@ -136,15 +137,17 @@ constexpr Word32 l_mult(Word16 a, Word16 b VAMRNB_SITE) {
 }
 // On overflow the true sum lies beyond the limit on the side of a's sign:
 // (a >> 31) ^ MAX_32 is MAX_32 for a >= 0 and MIN_32 for a < 0.
+constexpr Word32 rail32(Word32 a, Word32 s, bool over, [[maybe_unused]] const char *op VAMRNB_SITE_PARAM) {
+    VAMRNB_SATURATED(over, op);
+    return over ? (a >> 31) ^ MAX_32 : s;
+}
 constexpr Word32 l_add(Word32 a, Word32 b VAMRNB_SITE) {
 #if VAMRNB_ARCH_OPS
     if (!std::is_constant_evaluated()) return arch::l_add(a, b);
 #endif
     Word32 s = 0;
     const bool over = __builtin_add_overflow(a, b, &s);
-    VAMRNB_SATURATED(over, "l_add");
-    if (over) return (a >> 31) ^ MAX_32;
-    return s;
+    return rail32(a, s, over, "l_add" VAMRNB_SITE_ARG);
 }
 constexpr Word32 l_sub(Word32 a, Word32 b VAMRNB_SITE) {
 #if VAMRNB_ARCH_OPS
@@ -152,9 +155,7 @@ constexpr Word32 l_sub(Word32 a, Word32 b VAMRNB_SITE) {
 #endif
     Word32 s = 0;
     const bool over = __builtin_sub_overflow(a, b, &s);
-    VAMRNB_SATURATED(over, "l_sub");
-    if (over) return (a >> 31) ^ MAX_32;
-    return s;
+    return rail32(a, s, over, "l_sub" VAMRNB_SITE_ARG);
 }
 constexpr Word32 l_mac(Word32 acc, Word16 a, Word16 b VAMRNB_SITE) {
     return l_add(acc, l_mult(a, b VAMRNB_SITE_ARG) VAMRNB_SITE_ARG);
