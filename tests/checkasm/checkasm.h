@@ -91,23 +91,27 @@ public:
         version_new_ = version_new;
     }
 
-    // Runs `check` for every version of the kernel stored in `member` that a
-    // level newly installs: check(level's function) returns true when its
-    // outputs match the portable version on every input; then, with --bench,
-    // times call(portable) against call(level's function).
+    // Checks every version of the kernel stored in `member` that a level
+    // newly installs: same(fn, t) compares it with the portable version on
+    // input number t, for t below n (times --runs).  Then, with --bench, it
+    // sets ordinary inputs (typical) and times call(portable) against
+    // call(fn).
     template <class Fn>
-    void kernel(const char *name, Fn DspKernels::*member, const std::function<bool(Fn)> &check,
-                const std::function<void(Fn)> &call) {
+    void kernel(const char *name, Fn DspKernels::*member, int n, const std::function<bool(Fn, int)> &same,
+                const std::function<void()> &typical, const std::function<void(Fn)> &call) {
         for_each_version(name, [&](const DspKernels &k, const DspKernels &below, const char *level) {
-            const Fn fn = k.*member;
+            const Fn fn = k.*member, ref = vamrnb::dsp_for(0).*member;
             if (fn == below.*member) return;   // nothing new at this level
+            bool ok = true;
+            for (int t = 0; t < n * runs(); ++t)
+                if (!same(fn, t)) ok = fail("input " + std::to_string(t));
+            typical();
             if (calls_ >= 0) {
-                (void)check(fn);
-                for (long i = 0; i < calls_; ++i) call(version_new_ ? fn : vamrnb::dsp_for(0).*member);
+                for (long i = 0; i < calls_; ++i) call(version_new_ ? fn : ref);
                 return;
             }
-            report(name, level, check(fn));
-            if (bench_) bench(name, level, [&] { call(vamrnb::dsp_for(0).*member); }, [&] { call(fn); });
+            report(name, level, ok);
+            if (bench_) bench(name, level, [&] { call(ref); }, [&] { call(fn); });
         });
     }
 
