@@ -14,7 +14,7 @@
 #include "basic_op/ext_op.h"
 #include "enc/cbsearch_lowrate.h"
 #include "lpc/dsp.h"
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {

@@ -15,7 +15,7 @@
 
 #include "basic_op/ext_op.h"
 #include "lpc/dsp.h"
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {

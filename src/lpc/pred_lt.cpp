@@ -3,7 +3,7 @@
 // FIR of 2 × 10 taps.  Outputs overwrite exc[0..39] in order, so with a delay
 // shorter than the subframe later outputs read earlier ones.
 #include "lpc/dsp.h"
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 

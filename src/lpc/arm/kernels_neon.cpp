@@ -9,7 +9,7 @@
 #if defined(VAMRNB_DSP_NEON)
 
 #include "lpc/arm/simd_arm.h"
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/syn_core.h"
 #include "lpc/tables.h"
@@ -106,7 +106,7 @@ Word32 energy_neon(const Word16 *x, Word32 n, Word32 init) {
     return vget_lane_s32(vqadd_s32(d, vrev64_s32(d)), 0);
 }
 
-// The exact sum where the bound allows it (enc_kernels.h), otherwise the
+// The exact sum where the bound allows it (kernel_common.h), otherwise the
 // portable sequential version.
 Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init) {
     if (n <= 0) return init;

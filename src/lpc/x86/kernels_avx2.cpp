@@ -6,7 +6,7 @@
 
 #if defined(VAMRNB_DSP_X86)
 
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 #include "lpc/x86/simd_x86.h"

@@ -7,7 +7,7 @@
 
 #if defined(VAMRNB_DSP_X86)
 
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/syn_core.h"
 #include "lpc/tables.h"
@@ -124,7 +124,7 @@ VAMRNB_SSE41 Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init) {
 }
 
 // The exact sum with 16-bit pair products where the bound allows it
-// (enc_kernels.h), otherwise the portable sequential version.
+// (kernel_common.h), otherwise the portable sequential version.
 VAMRNB_SSE41 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init) {
     if (n <= 0) return init;
     const Word32 n8 = n & ~7;
