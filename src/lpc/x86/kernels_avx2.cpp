@@ -48,25 +48,9 @@ VAMRNB_AVX2 void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 
     }
 }
 
-namespace {
-
-VAMRNB_AVX2 Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
-    __m256i acc = _mm256_setzero_si256();
-    Word32 j = 0;
-    for (; j + 16 <= n; j += 16)
-        acc = _mm256_add_epi32(
-            acc, _mm256_madd_epi16(_mm256_loadu_si256(reinterpret_cast<const __m256i *>(x + j)),
-                                   _mm256_loadu_si256(reinterpret_cast<const __m256i *>(y + j))));
-    int64_t s = hsum(acc);
-    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
-    return static_cast<Word32>(2 * s);
-}
-
-}  // namespace
-
 VAMRNB_AVX2 void comp_corr_avx2(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min,
                                 Word32 *corr) {
-    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
+    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact_avx2);
 }
 
 // Eight outputs per step (see the SSE4.1 version).

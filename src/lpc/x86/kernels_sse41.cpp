@@ -144,25 +144,9 @@ VAMRNB_SSE41 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32
     return enc_kernel::inner_product_finish(x, y, n, n8, init, ax, ay, sums, inner_product_c);
 }
 
-namespace {
-
-// 2·sum x·y in any order; only for sums known not to saturate.
-VAMRNB_SSE41 Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
-    __m128i acc = _mm_setzero_si128();
-    Word32 j = 0;
-    for (; j + 8 <= n; j += 8)
-        acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_loadu_si128(reinterpret_cast<const __m128i *>(x + j)),
-                                                _mm_loadu_si128(reinterpret_cast<const __m128i *>(y + j))));
-    int64_t s = hsum(acc);
-    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
-    return static_cast<Word32>(2 * s);
-}
-
-}  // namespace
-
 VAMRNB_SSE41 void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min,
                                   Word32 *corr) {
-    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
+    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact_sse41);
 }
 
 // Four outputs per step; h is read through a copy with 40 zeros in front so

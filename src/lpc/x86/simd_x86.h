@@ -96,4 +96,29 @@ inline int32_t pair16(Word16 lo, Word16 hi) {
                                 (static_cast<uint32_t>(static_cast<uint16_t>(hi)) << 16));
 }
 
+// 2·sum x·y in any order with 16-bit pair products; only for sums known not
+// to saturate (kernel_common.h decides).
+VAMRNB_SSE41 inline Word32 dot_exact_sse41(const Word16 *x, const Word16 *y, Word32 n) {
+    __m128i acc = _mm_setzero_si128();
+    Word32 j = 0;
+    for (; j + 8 <= n; j += 8)
+        acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_loadu_si128(reinterpret_cast<const __m128i *>(x + j)),
+                                                _mm_loadu_si128(reinterpret_cast<const __m128i *>(y + j))));
+    int64_t s = hsum(acc);
+    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
+    return static_cast<Word32>(2 * s);
+}
+
+VAMRNB_AVX2 inline Word32 dot_exact_avx2(const Word16 *x, const Word16 *y, Word32 n) {
+    __m256i acc = _mm256_setzero_si256();
+    Word32 j = 0;
+    for (; j + 16 <= n; j += 16)
+        acc = _mm256_add_epi32(
+            acc, _mm256_madd_epi16(_mm256_loadu_si256(reinterpret_cast<const __m256i *>(x + j)),
+                                   _mm256_loadu_si256(reinterpret_cast<const __m256i *>(y + j))));
+    int64_t s = hsum(acc);
+    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
+    return static_cast<Word32>(2 * s);
+}
+
 }  // namespace vamrnb::x86
