@@ -130,6 +130,23 @@ VAMRNB_API void    vamrnbe_delete(vamrnb_encoder *enc);
 #define VAMRNB_CPU_NEON  0x4u
 VAMRNB_API uint32_t vamrnb_set_cpu_flags(uint32_t mask);
 
+/* ---- status texts and version ------------------------------------------ */
+
+/**
+ * Short English text for a status code: those of this header, of
+ * vamrnb_stream.h, and "unknown status" for any other value.
+ * @param status  A status returned by a function of the library.
+ * @return A static, NUL-terminated string; never NULL.
+ */
+VAMRNB_API const char *vamrnb_strerror(int32_t status);
+
+/**
+ * Version of the library actually loaded, as "MAJOR.MINOR.PATCH"; it equals
+ * the VAMRNB_VERSION_* macros of the header the library was built with.
+ * @return A static, NUL-terminated string.
+ */
+VAMRNB_API const char *vamrnb_version(void);
+
 #ifdef __cplusplus
 }
 #endif
