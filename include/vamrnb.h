@@ -411,8 +411,9 @@ VAMRNB_API void    vamrnbe_delete(vamrnb_encoder *enc);
  * process-wide, like #vamrnb_inited: it applies to all instances, and
  * should be changed while no instance is working.
  * @param mask an OR of VAMRNB_CPU_* flags; 0 selects the portable code;
- *             features the processor lacks are ignored.  Every value is
- *             accepted.
+ *             features the processor lacks are ignored.  The x86 levels
+ *             build on each other: AVX2 code runs only when SSE4.1 is
+ *             allowed too.  Every value is accepted.
  * @return the previous mask (all bits set at start-up).
  */
 VAMRNB_API uint32_t vamrnb_set_cpu_flags(uint32_t mask);

@@ -8,7 +8,7 @@
 // the linear interpolation factor.
 #include "basic_op/ext_op.h"
 
-#include "lpc/tables.h"
+#include "basic_op/op_tables.h"
 
 using namespace vamrnb;
 

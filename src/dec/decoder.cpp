@@ -191,8 +191,7 @@ extern "C" vamrnb_decoder *vamrnbd_create(const codec_config *config, int32_t *e
 extern "C" void vamrnbd_reset(vamrnb_decoder *dec) {
     VAMRNB_REQUIRE(dec);
     dec_state *st = as_state(dec);
-    std::memset(&st->cn, 0, sizeof st->cn);
-    reset_dec(st, 0);
+    reset_dec(st, 0);   // resets the comfort-noise state through its owner
 }
 
 extern "C" void vamrnbd_delete(vamrnb_decoder *dec) {
@@ -240,7 +239,6 @@ extern "C" int32_t vamrnbd_decode(vamrnb_decoder *dec, const bitstream_buffer *i
         for (int i = 0; i < L_FRAME; ++i) pcm[i] = HOMING_SAMPLE;
     } else {
         w->serial = serial;
-        w->dtx_state_prev = st->cn.dtxGlobalState;
         const int16_t *cursor = w->prm;
         vamrnbd_dtx(st, w, &cursor);
         if (vamrnbd_lsp(st, w, &cursor) != 2) {

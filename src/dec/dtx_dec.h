@@ -2,6 +2,11 @@
 // that chooses between speech and comfort noise, the bit-to-parameter step of
 // every accepted frame, the comfort-noise synthesis itself, and the histories
 // of spectrum and level kept while speech is being decoded.
+//
+// This stage owns the reception DTX state (dec_state::cn, and
+// dec_work::dtx_state_prev for the frame): only the functions here write it;
+// the decoder driver and the speech stages read it.  When comfort noise
+// takes over, the stage restarts the speech state through reset_dec.
 #pragma once
 
 #include "basic_op/basic_op.h"

@@ -14,7 +14,7 @@
 #include "basic_op/ext_op.h"
 #include "enc/cbsearch_lowrate.h"
 #include "lpc/dsp.h"
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
@@ -380,6 +380,10 @@ void search_10and8i40(Word16 nb_pulse, Word16 step, Word16 nb_tracks, const Word
     }
 }
 
+void cor_h_x_c(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf) {
+    cor_h_x2(h, x, dn, static_cast<Word16>(sf), 5, 5);
+}
+
 }  // namespace vamrnb
 
 using namespace vamrnb;
@@ -387,12 +391,7 @@ using namespace vamrnb;
 extern "C" {
 
 void vamrnbe_cor_h_x(const int16_t *h, const int16_t *x, int16_t *dn, int32_t sf) {
-    // A vector version with identical results takes over where available.
-    if (const CorHxFn vec = dsp().cor_h_x) {
-        vec(h, x, dn, sf);
-        return;
-    }
-    cor_h_x2(h, x, dn, static_cast<Word16>(sf), 5, 5);
+    dsp().cor_h_x(h, x, dn, sf);
 }
 
 void vamrnbe_cor_h_sign(const int16_t *h2, const int16_t *sign, int16_t *rr) {

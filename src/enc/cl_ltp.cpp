@@ -15,7 +15,7 @@
 
 #include "basic_op/ext_op.h"
 #include "lpc/dsp.h"
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
@@ -210,41 +210,32 @@ inline Word32 mac_flag(Word32 acc, Word16 a, Word16 b, bool &sat) {
     return sat32(r);
 }
 
+// 1 + <a,b> normalised: rounded mantissa and exponent.  When the sum
+// saturates it is formed again from the scaled-down operands (a_q, b_q) and
+// the exponent is lowered by the q_bits they lost together.
+void norm_dot(const Word16 *a, const Word16 *b, const Word16 *a_q, const Word16 *b_q, Word16 q_bits,
+              Word16 *mant, Word16 *exp) {
+    bool sat = false;
+    Word32 s = 1;
+    for (int i = 0; i < L_SUBFR; ++i) s = mac_flag(s, a[i], b[i], sat);
+    if (sat) {
+        s = 1;
+        for (int i = 0; i < L_SUBFR; ++i) s = l_mac(s, a_q[i], b_q[i]);
+    }
+    *exp = norm_l(s);
+    *mant = round16(l_shl(s, *exp));
+    if (sat) *exp = sub(*exp, q_bits);
+}
+
 // Pitch gain <xn,y1>/<y1,y1> in Q14, limited to 0..1.2; g_coeff receives the
 // normalised correlation terms for the gain quantisers.
 Word16 g_pitch(int32_t mode, const Word16 *xn, const Word16 *y1, Word16 *g_coeff) {
     Word16 y1_q[L_SUBFR];
     for (int i = 0; i < L_SUBFR; ++i) y1_q[i] = shr(y1[i], 2);
 
-    bool sat = false;
-    Word32 s = 1;
-    for (int i = 0; i < L_SUBFR; ++i) s = mac_flag(s, y1[i], y1[i], sat);
-    Word16 exp_yy, yy;
-    if (!sat) {
-        exp_yy = norm_l(s);
-        yy = round16(l_shl(s, exp_yy));
-    } else {
-        s = 1;
-        for (int i = 0; i < L_SUBFR; ++i) s = l_mac(s, y1_q[i], y1_q[i]);
-        exp_yy = norm_l(s);
-        yy = round16(l_shl(s, exp_yy));
-        exp_yy = sub(exp_yy, 4);
-    }
-
-    sat = false;
-    s = 1;
-    for (int i = 0; i < L_SUBFR; ++i) s = mac_flag(s, xn[i], y1[i], sat);
-    Word16 exp_xy, xy;
-    if (!sat) {
-        exp_xy = norm_l(s);
-        xy = round16(l_shl(s, exp_xy));
-    } else {
-        s = 1;
-        for (int i = 0; i < L_SUBFR; ++i) s = l_mac(s, xn[i], y1_q[i]);
-        exp_xy = norm_l(s);
-        xy = round16(l_shl(s, exp_xy));
-        exp_xy = sub(exp_xy, 2);
-    }
+    Word16 exp_yy, yy, exp_xy, xy;
+    norm_dot(y1, y1, y1_q, y1_q, 4, &yy, &exp_yy);
+    norm_dot(xn, y1, xn, y1_q, 2, &xy, &exp_xy);
 
     g_coeff[0] = yy;
     g_coeff[1] = sub(15, exp_yy);
@@ -337,24 +328,21 @@ void limit_pitch_gain(int32_t mode, Word16 lsp_flag, const Word16 gp[GP_HIST], W
     }
 }
 
-}  // namespace vamrnb
-
-using namespace vamrnb;
-
-extern "C" {
-
-void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y) {
-    // A vector version with identical results takes over where available.
-    if (const ConvolveFn vec = dsp().convolve) {
-        vec(x, h, y);
-        return;
-    }
+void convolve_c(const Word16 *x, const Word16 *h, Word16 *y) {
     for (int n = 0; n < L_SUBFR; ++n) {
         Word32 s = 0;
         for (int i = 0; i <= n; ++i) s = l_mac(s, x[i], h[n - i]);
         y[n] = extract_h(l_shl(s, 3));
     }
 }
+
+}  // namespace vamrnb
+
+using namespace vamrnb;
+
+extern "C" {
+
+void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y) { dsp().convolve(x, h, y); }
 
 void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t *h,
                             int32_t t_min, int32_t t_max, int16_t *corr) {

@@ -5,7 +5,7 @@
 #include <cstring>
 
 #include "common/checks.h"
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "enc/subframe.h"
 #include "common/bitstream.h"
 #include "format/frame_format.h"

@@ -5,7 +5,7 @@
 // tone-stability check on the new LSPs.  MR122 analyses two windows per frame
 // and quantises both LSP vectors jointly (inline here); every other mode
 // analyses one window and uses the three-split quantiser.
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "basic_op/ext_op.h"
 #include "lpc/tables.h"
 

@@ -6,7 +6,7 @@
 // tone, pitch and high-pass correlation flags for the sub-band detector,
 // summed correlation and energy with the long-term-prediction flag for the
 // spectral detector.
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "basic_op/ext_op.h"
 #include "lpc/dsp.h"
 #include "lpc/tables.h"
@@ -267,13 +267,9 @@ Word16 ol_ltp(enc_state *st, int32_t mode, const Word16 *wsp, int len, int idx,
 
 }  // namespace vamrnb
 
-extern "C" void vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max,
-                                  int32_t lag_min, int32_t *corr) {
-    // A vector version with identical results takes over where available.
-    if (const CompCorrFn vec = dsp().comp_corr) {
-        vec(x, len, lag_max, lag_min, corr);
-        return;
-    }
+namespace vamrnb {
+
+void comp_corr_c(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr) {
     // Every partial sum of 2 x[j] x[j-lag] is bounded by the doubled energy of
     // the whole span x[-lag_max .. len-1].  When that fits in 32 bits no
     // step of the saturating sum can clip, and plain products give the same
@@ -295,6 +291,13 @@ extern "C" void vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max
         for (int32_t j = 0; j < len; ++j) t = l_mac(t, x[j], d[j]);
         corr[-lag] = t;
     }
+}
+
+}  // namespace vamrnb
+
+extern "C" void vamrnbe_comp_corr(const int16_t *x, int32_t len, int32_t lag_max,
+                                  int32_t lag_min, int32_t *corr) {
+    dsp().comp_corr(x, len, lag_max, lag_min, corr);
 }
 
 extern "C" void vamrnbe_olp(enc_state *st, enc_frame *fr, vad_area *vad) {

@@ -2,7 +2,7 @@
 // caller's own buffer) and runs the 80 Hz second-order high-pass filter with
 // its built-in halving of the signal, writing the filtered frame into the
 // newest part of the speech history.
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "lpc/tables.h"
 
 using namespace vamrnb;

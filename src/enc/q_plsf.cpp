@@ -4,7 +4,7 @@
 // weighted residual is matched against three codebooks.  The search kernels
 // here also serve the two-vector split-matrix quantiser that the LP analysis
 // runs inline for MR122.
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "lpc/dsp.h"
 #include "lpc/tables.h"
 
@@ -58,14 +58,9 @@ void lsf_wt(const Word16 lsf[M], Word16 wf[M]) {
     }
 }
 
-}  // namespace vamrnb
+// The portable split-VQ searches (kernel table entries).
 
-// Each search kernel hands the call to a vector version with identical
-// results where the processor has one.
-
-extern "C" int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int16_t *w,
-                                      int32_t size) {
-    if (const auto vec = dsp().vq_subvec4) return vec(r, dico, w, size);
+int16_t vq_subvec4_c(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size) {
     Word32 best = MAX_32;
     int index = 0;
     const Word16 *row = dico;
@@ -84,9 +79,8 @@ extern "C" int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int
     return static_cast<Word16>(index);
 }
 
-extern "C" int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *dico,
-                                     const int16_t *w1, const int16_t *w2, int32_t size) {
-    if (const auto vec = dsp().vq_subvec) return vec(r1, r2, dico, w1, w2, size);
+int16_t vq_subvec_c(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1, const Word16 *w2,
+                    Word32 size) {
     Word32 best = MAX_32;
     int index = 0;
     const Word16 *row = dico;
@@ -108,9 +102,8 @@ extern "C" int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *di
     return static_cast<Word16>(index);
 }
 
-extern "C" int16_t vamrnbe_vq_subvec_s(int16_t *r1, int16_t *r2, const int16_t *dico,
-                                       const int16_t *w1, const int16_t *w2, int32_t size) {
-    if (const auto vec = dsp().vq_subvec_s) return vec(r1, r2, dico, w1, w2, size);
+int16_t vq_subvec_s_c(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
+                      const Word16 *w2, Word32 size) {
     Word32 best = MAX_32;
     int index = 0;
     int sign = 0;
@@ -150,6 +143,23 @@ extern "C" int16_t vamrnbe_vq_subvec_s(int16_t *r1, int16_t *r2, const int16_t *
         r2[1] = negate(pick[3]);
     }
     return add(shl(static_cast<Word16>(index), 1), sign);
+}
+
+}  // namespace vamrnb
+
+extern "C" int16_t vamrnbe_vq_subvec4(int16_t *r, const int16_t *dico, const int16_t *w,
+                                      int32_t size) {
+    return dsp().vq_subvec4(r, dico, w, size);
+}
+
+extern "C" int16_t vamrnbe_vq_subvec(int16_t *r1, int16_t *r2, const int16_t *dico,
+                                     const int16_t *w1, const int16_t *w2, int32_t size) {
+    return dsp().vq_subvec(r1, r2, dico, w1, w2, size);
+}
+
+extern "C" int16_t vamrnbe_vq_subvec_s(int16_t *r1, int16_t *r2, const int16_t *dico,
+                                       const int16_t *w1, const int16_t *w2, int32_t size) {
+    return dsp().vq_subvec_s(r1, r2, dico, w1, w2, size);
 }
 
 extern "C" void vamrnbe_q_plsf_3(int32_t mode, const int16_t lsp[10], int16_t lsp_q[10],

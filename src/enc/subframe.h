@@ -6,7 +6,7 @@
 
 #include <cstdint>
 
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 
 extern "C" {
 // Stages (instance, work record, subframe start 0/40/80/120).

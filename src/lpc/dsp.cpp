@@ -1,62 +1,57 @@
-// Kernel table selection.  The tables are constant; the one in use is kept in
-// an atomic pointer, chosen on the first kernel call from the detected
-// features and re-chosen whenever the caller changes the allowed-feature mask.
+// Kernel table selection.  One table per combination of the three feature
+// bits is built once (portable entries first, then the architecture's
+// levels); the one in use is kept in an atomic pointer, chosen on the first
+// kernel call from the detected features and re-chosen whenever the caller
+// changes the allowed-feature mask.
 #include "lpc/dsp.h"
 
+#include <array>
 #include <atomic>
 
+#include "lpc/arm/dsp_arm.h"
+#include "lpc/x86/dsp_x86.h"
 #include "vamrnb.h"
 
 namespace vamrnb {
 namespace {
 
-constexpr DspKernels kScalar = {
-    syn_filt_c, syn_filt_m_c, residu_c, pred_lt_3or6_c, energy_c, inner_product_c,
-    nullptr, nullptr, nullptr, nullptr, nullptr, nullptr,
-};
+constexpr uint32_t kAllFlags = kCpuSse41 | kCpuAvx2 | kCpuNeon;
 
+DspKernels build(uint32_t flags) {
+    DspKernels c{};
+    c.syn_filt = syn_filt_c;
+    c.syn_filt_m = syn_filt_m_c;
+    c.residu = residu_c;
+    c.pred_lt_3or6 = pred_lt_3or6_c;
+    c.energy = energy_c;
+    c.inner_product = inner_product_c;
+    c.comp_corr = comp_corr_c;
+    c.convolve = convolve_c;
+    c.vq_subvec = vq_subvec_c;
+    c.vq_subvec_s = vq_subvec_s_c;
+    c.vq_subvec4 = vq_subvec4_c;
+    c.cor_h_x = cor_h_x_c;
 #if defined(VAMRNB_DSP_X86)
-constexpr DspKernels kSse41 = {
-    syn_filt_c, syn_filt_m_sse41, residu_sse41, pred_lt_3or6_sse41, energy_sse41,
-    inner_product_sse41, comp_corr_sse41, convolve_sse41,
-    vq_subvec_sse41, vq_subvec_s_sse41, vq_subvec4_sse41, cor_h_x_sse41,
-};
-constexpr DspKernels kSse41Avx2 = {
-    syn_filt_c, syn_filt_m_sse41, residu_avx2, pred_lt_3or6_avx2, energy_sse41,
-    inner_product_sse41, comp_corr_avx2, convolve_avx2,
-    vq_subvec_sse41, vq_subvec_s_sse41, vq_subvec4_sse41, cor_h_x_avx2,
-};
-// AVX2 allowed while SSE4.1 is masked off: only the AVX2 kernels.
-constexpr DspKernels kAvx2Only = {
-    syn_filt_c, syn_filt_m_c, residu_avx2, pred_lt_3or6_avx2, energy_c, inner_product_c,
-    comp_corr_avx2, convolve_avx2, nullptr, nullptr, nullptr, cor_h_x_avx2,
-};
+    dsp_init_x86(c, flags);
 #endif
-
 #if defined(VAMRNB_DSP_NEON)
-constexpr DspKernels kNeon = {
-    syn_filt_neon, syn_filt_m_neon, residu_neon, pred_lt_3or6_neon, energy_neon,
-    inner_product_neon, comp_corr_neon, convolve_neon,
-    vq_subvec_neon, vq_subvec_s_neon, vq_subvec4_neon, cor_h_x_neon,
-};
+    dsp_init_arm(c, flags);
 #endif
+    (void)flags;
+    return c;
+}
+
+const DspKernels *select(uint32_t flags) {
+    static const std::array<DspKernels, kAllFlags + 1> tables = [] {
+        std::array<DspKernels, kAllFlags + 1> t{};
+        for (uint32_t f = 0; f <= kAllFlags; ++f) t[f] = build(f);
+        return t;
+    }();
+    return &tables[flags & kAllFlags];
+}
 
 std::atomic<uint32_t> g_mask{~0u};
 std::atomic<const DspKernels *> g_active{nullptr};
-
-const DspKernels *select(uint32_t flags) {
-#if defined(VAMRNB_DSP_X86)
-    const bool sse41 = flags & kCpuSse41, avx2 = flags & kCpuAvx2;
-    if (sse41 && avx2) return &kSse41Avx2;
-    if (sse41) return &kSse41;
-    if (avx2) return &kAvx2Only;
-#endif
-#if defined(VAMRNB_DSP_NEON)
-    if (flags & kCpuNeon) return &kNeon;
-#endif
-    (void)flags;
-    return &kScalar;
-}
 
 }  // namespace
 

@@ -1,8 +1,12 @@
 // Run-time selection of the subframe kernels.  Every kernel has a portable
-// scalar version (the definition of its result) and may have vector versions
-// for SSE4.1, AVX2 or NEON that produce identical bits.  A table of function
-// pointers per feature set is chosen once from the processor's features,
-// restricted by the mask set with vamrnb_set_cpu_flags.
+// version (the `_c` functions, the definition of its result) and may have
+// vector versions for SSE4.1, AVX2 or NEON that produce identical bits.
+//
+// A kernel table is filled with the portable versions first; then the init
+// function of the build's architecture (x86/dsp_x86.h, arm/dsp_arm.h)
+// replaces entries level by level, stopping at the first level the allowed
+// features lack.  So a new kernel is one entry here, one `_c` function and
+// one line per level; a new level is one block in its architecture's init.
 #pragma once
 
 #include <cstdint>
@@ -11,7 +15,8 @@
 
 namespace vamrnb {
 
-// Feature bits; equal to the public VAMRNB_CPU_* values.
+// Feature bits; equal to the public VAMRNB_CPU_* values.  On x86 the levels
+// build on each other: AVX2 versions are used only together with SSE4.1.
 inline constexpr uint32_t kCpuSse41 = 1u << 0;
 inline constexpr uint32_t kCpuAvx2 = 1u << 1;
 inline constexpr uint32_t kCpuNeon = 1u << 2;
@@ -29,6 +34,8 @@ using VqSubvecFn = int16_t (*)(Word16 *r1, Word16 *r2, const Word16 *dico, const
 using CorHxFn = void (*)(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
 using VqSubvec4Fn = int16_t (*)(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
 
+// One entry per kernel; the exported function of the same name (vamrnb_*,
+// vamrnbe_*) calls through the table in use.
 struct DspKernels {
     SynFiltFn syn_filt;
     SynFiltMFn syn_filt_m;
@@ -36,75 +43,44 @@ struct DspKernels {
     PredLtFn pred_lt_3or6;
     EnergyFn energy;
     InnerProductFn inner_product;
-    // Encoder kernels whose portable versions live with the encoder stages:
-    // null in the portable set, so that the owner's exported function runs
-    // its own loop; otherwise a vector version with identical results that
-    // the exported function hands the call to.
-    CompCorrFn comp_corr;   // as vamrnbe_comp_corr
-    ConvolveFn convolve;    // as vamrnbe_convolve
-    VqSubvecFn vq_subvec;   // as vamrnbe_vq_subvec
-    VqSubvecFn vq_subvec_s; // as vamrnbe_vq_subvec_s
-    VqSubvec4Fn vq_subvec4; // as vamrnbe_vq_subvec4
-    CorHxFn cor_h_x;        // as vamrnbe_cor_h_x
+    CompCorrFn comp_corr;
+    ConvolveFn convolve;
+    VqSubvecFn vq_subvec;
+    VqSubvecFn vq_subvec_s;
+    VqSubvec4Fn vq_subvec4;
+    CorHxFn cor_h_x;
 };
 
 // The kernel set in use (selected on first call).
 const DspKernels &dsp();
 
 // The kernel set for the given feature bits (bits the build or the processor
-// lacks are ignored).  Used by the tests to run every version side by side.
+// lacks are ignored).  Used by checkasm to run every level side by side.
 const DspKernels &dsp_for(uint32_t flags);
 
 // Features of this processor that the build has vector code for.
 uint32_t cpu_detect();
 
-// ---- portable versions ------------------------------------------------------
-void syn_filt_c(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
-void syn_filt_m_c(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
-void residu_c(const Word16 *a, const Word16 *x, Word16 *y);
-void pred_lt_3or6_c(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-Word32 energy_c(const Word16 *x, Word32 n, Word32 init);
-Word32 inner_product_c(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+// Declares one version of every kernel, named <kernel>_<suffix>.  Each
+// architecture header declares its levels with it and installs, in its init
+// function, the versions it defines; the others are never referenced.
+#define VAMRNB_DECL_KERNELS(sfx)                                                                   \
+    void syn_filt_##sfx(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);           \
+    void syn_filt_m_##sfx(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);        \
+    void residu_##sfx(const Word16 *a, const Word16 *x, Word16 *y);                                \
+    void pred_lt_3or6_##sfx(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);                    \
+    Word32 energy_##sfx(const Word16 *x, Word32 n, Word32 init);                                   \
+    Word32 inner_product_##sfx(const Word16 *x, const Word16 *y, Word32 n, Word32 init);           \
+    void comp_corr_##sfx(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr); \
+    void convolve_##sfx(const Word16 *x, const Word16 *h, Word16 *y);                              \
+    int16_t vq_subvec_##sfx(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,          \
+                            const Word16 *w2, Word32 size);                                        \
+    int16_t vq_subvec_s_##sfx(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,        \
+                              const Word16 *w2, Word32 size);                                      \
+    int16_t vq_subvec4_##sfx(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);         \
+    void cor_h_x_##sfx(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
 
-// ---- vector versions (defined only where the build targets them) -----------
-#if defined(__x86_64__) || defined(__i386__)
-#define VAMRNB_DSP_X86 1
-void syn_filt_m_sse41(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
-void residu_sse41(const Word16 *a, const Word16 *x, Word16 *y);
-void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init);
-Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
-void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
-void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y);
-void cor_h_x_sse41(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
-void cor_h_x_avx2(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
-int16_t vq_subvec_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                        const Word16 *w2, Word32 size);
-int16_t vq_subvec_s_sse41(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                          const Word16 *w2, Word32 size);
-int16_t vq_subvec4_sse41(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
-void residu_avx2(const Word16 *a, const Word16 *x, Word16 *y);
-void comp_corr_avx2(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
-void convolve_avx2(const Word16 *x, const Word16 *h, Word16 *y);
-void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-#endif
-
-#if defined(__ARM_NEON) || defined(__ARM_NEON__)
-#define VAMRNB_DSP_NEON 1
-void syn_filt_neon(const Word16 *a, const Word16 *x, const Word16 *mem, Word16 *y);
-void syn_filt_m_neon(const Word16 *a, const Word16 *x, Word32 *overflow, Word16 *buf);
-void residu_neon(const Word16 *a, const Word16 *x, Word16 *y);
-void pred_lt_3or6_neon(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
-Word32 energy_neon(const Word16 *x, Word32 n, Word32 init);
-Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
-void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
-void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y);
-void cor_h_x_neon(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
-int16_t vq_subvec_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                       const Word16 *w2, Word32 size);
-int16_t vq_subvec_s_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
-                         const Word16 *w2, Word32 size);
-int16_t vq_subvec4_neon(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
-#endif
+// The portable versions, each defined beside the stage that owns it.
+VAMRNB_DECL_KERNELS(c)
 
 }  // namespace vamrnb

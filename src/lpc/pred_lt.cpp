@@ -3,29 +3,22 @@
 // FIR of 2 × 10 taps.  Outputs overwrite exc[0..39] in order, so with a delay
 // shorter than the subframe later outputs read earlier ones.
 #include "lpc/dsp.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
 
 void pred_lt_3or6_c(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
-    constexpr int kUp = 6;
-    Word32 f = -frac;
-    if (flag3 != 0) f *= 2;            // 1/3 grid onto the 1/6 grid
-    const Word16 *x0 = exc - T0;
-    if (f < 0) {
-        f += kUp;
-        --x0;
-    }
-    const Word16 *c1 = &vamrnb_tbl_pred_inter_6[f];
-    const Word16 *c2 = &vamrnb_tbl_pred_inter_6[kUp - f];
+    Word16 c1[10], c2[10];
+    const Word16 *x0 = enc_kernel::pred_lt_taps(T0, frac, flag3, exc, c1, c2);
     for (int j = 0; j < L_SUBFR; ++j) {
         const Word16 *x1 = x0 + j;
         const Word16 *x2 = x0 + j + 1;
         Word32 s = 0;
         for (int i = 0; i < L_INTERPOL - 1; ++i) {
-            s = l_mac(s, x1[-i], c1[kUp * i]);
-            s = l_mac(s, x2[i], c2[kUp * i]);
+            s = l_mac(s, x1[-i], c1[i]);
+            s = l_mac(s, x2[i], c2[i]);
         }
         exc[j] = round16(s);
     }

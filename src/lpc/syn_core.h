@@ -33,4 +33,18 @@ struct Flagged {
     }
 };
 
+// The four outputs of one vector step: p[k] holds lane k's sum over the
+// outputs of earlier steps; the taps that reach outputs of this step
+// (y[0..2] for the later lanes) are added here in order, as the portable
+// filter would.
+template <class Rule>
+inline void finish4(const Word16 *a, const Word32 p[4], Word16 *y, Word32 *overflow) {
+    y[0] = Rule::out(p[0], overflow);
+    y[1] = Rule::out(wrap_sub(p[1], wrap_mul(a[1], y[0])), overflow);
+    y[2] = Rule::out(wrap_sub(p[2], wrap_add(wrap_mul(a[1], y[1]), wrap_mul(a[2], y[0]))), overflow);
+    y[3] = Rule::out(wrap_sub(p[3], wrap_add(wrap_add(wrap_mul(a[1], y[2]), wrap_mul(a[2], y[1])),
+                                             wrap_mul(a[3], y[0]))),
+                     overflow);
+}
+
 }  // namespace vamrnb::syn

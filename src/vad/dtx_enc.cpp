@@ -8,7 +8,7 @@
 
 #include "vamrnb_dsp.h"
 #include "basic_op/ext_op.h"
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
 

@@ -4,7 +4,7 @@
 // analyse the noise) or hands it to the SID encoder.
 #include "vad/vad.h"
 
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 
 namespace vamrnb {
 namespace {

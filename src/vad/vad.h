@@ -8,7 +8,7 @@
 #include "vamrnb.h"
 #include "basic_op/basic_op.h"
 #include "vad/dtx_enc.h"
-#include "vad/vad_state.h"
+#include "common/vad_state.h"
 
 namespace vamrnb {
 

@@ -9,6 +9,7 @@
 
 #include "vamrnb.h"
 #include "vamrnb_stream.h"
+#include "dec_config.h"
 
 namespace {
 
@@ -38,14 +39,6 @@ std::vector<Frame> mixed_stream(uint32_t seed, int n = 60) {
         s.push_back(make_frame(ft, seed, i % 11 != 4));
     }
     return s;
-}
-
-codec_config config(int32_t layout, int32_t channels, int32_t format) {
-    codec_config c{};
-    c.dec.layout = layout;
-    c.dec.channels = channels;
-    c.dec.sample_format = format;
-    return c;
 }
 
 struct Decoder {
@@ -89,7 +82,7 @@ std::vector<std::vector<int16_t>> decode_all(Decoder &d, const std::vector<Frame
 }  // namespace
 
 TEST(DecoderApi, CreateChecksReservedWord) {
-    codec_config c = config(1, 1, 0);
+    codec_config c = dec_config(1, 1, 0);
     c.word[0] = 1;
     int32_t err = 0;
     EXPECT_EQ(vamrnbd_create(&c, &err), nullptr);
@@ -106,8 +99,8 @@ TEST(DecoderApi, CreateChecksReservedWord) {
 TEST(DecoderApi, RefusedOutputSettings) {
     uint32_t seed = 3;
     const Frame fr = make_frame(7, seed);
-    for (const codec_config &c : {config(1, 3, 0), config(1, -1, 0), config(1, 0, 1),
-                                  config(1, 0, 3), config(0, 1, 4), config(1, 2, -1)}) {
+    for (const codec_config &c : {dec_config(1, 3, 0), dec_config(1, -1, 0), dec_config(1, 0, 1),
+                                  dec_config(1, 0, 3), dec_config(0, 1, 4), dec_config(1, 2, -1)}) {
         Decoder d(c);
         d.info.frame_count = 41;
         EXPECT_EQ(d.decode(fr), AMRNB_ERR_UNSUPPORTED)
@@ -125,7 +118,7 @@ TEST(DecoderApi, RefusedFrameTypesLeaveNoTrace) {
         if (i % 5 == 2) with_refused.push_back(make_frame(10 + (i % 2), seed));
     }
 
-    Decoder plain(config(1, 1, 0)), other(config(1, 1, 0));
+    Decoder plain(dec_config(1, 1, 0)), other(dec_config(1, 1, 0));
     const auto expect = decode_all(plain, stream);
     std::vector<std::vector<int16_t>> got;
     uint32_t count = 0;
@@ -148,7 +141,7 @@ TEST(DecoderApi, RefusedFrameTypesLeaveNoTrace) {
 }
 
 TEST(DecoderApi, BytesConsumedPerFrameType) {
-    Decoder d(config(1, 1, 0));
+    Decoder d(dec_config(1, 1, 0));
     uint32_t seed = 1;
     for (int ft = 0; ft < 16; ++ft) {
         if (ft == 10 || ft == 11) continue;
@@ -172,16 +165,16 @@ TEST(DecoderApi, ResetMatchesFreshInstanceAndInstancesAreIndependent) {
     const auto warmup = mixed_stream(31, 25);
     const auto stream = mixed_stream(32, 50);
 
-    Decoder fresh(config(1, 1, 0));
+    Decoder fresh(dec_config(1, 1, 0));
     const auto expect = decode_all(fresh, stream);
 
-    Decoder used(config(1, 1, 0));
+    Decoder used(dec_config(1, 1, 0));
     decode_all(used, warmup);
     vamrnbd_reset(used.d);
     EXPECT_EQ(decode_all(used, stream), expect);
 
     // Two instances fed alternately give what each gives alone.
-    Decoder a(config(1, 1, 0)), b(config(1, 1, 0)), b_alone(config(1, 1, 0));
+    Decoder a(dec_config(1, 1, 0)), b(dec_config(1, 1, 0)), b_alone(dec_config(1, 1, 0));
     const auto expect_b = decode_all(b_alone, warmup);
     std::vector<std::vector<int16_t>> got_a, got_b;
     for (size_t i = 0; i < std::max(stream.size(), warmup.size()); ++i) {

@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "dec/dec_state.h"
+#include "dec_config.h"
 
 namespace {
 
@@ -21,14 +22,6 @@ struct Out {
     }
 };
 
-codec_config cfg(int32_t layout, int32_t channels, int32_t format) {
-    codec_config c{};
-    c.dec.layout = layout;
-    c.dec.channels = channels;
-    c.dec.sample_format = format;
-    return c;
-}
-
 std::vector<int16_t> ramp() {
     std::vector<int16_t> s(160);
     for (int i = 0; i < 160; ++i) s[i] = static_cast<int16_t>(i * 409 - 32768);
@@ -38,7 +31,7 @@ std::vector<int16_t> ramp() {
 TEST(DecoderOutput, SixteenBitOneChannelInterleaved) {
     Out o;
     auto s = ramp();
-    const codec_config c = cfg(1, 1, 0);
+    const codec_config c = dec_config(1, 1, 0);
     ASSERT_EQ(vamrnbd_recon(s.data(), &c, &o.pcm), 0);
     EXPECT_EQ(o.pcm.samples[0], 160u);
     EXPECT_EQ(o.pcm.bytes[0], 320u);
@@ -54,7 +47,7 @@ TEST(DecoderOutput, TwoChannelsInterleavedRepeatEachSample) {
     Out o;
     auto s = ramp();
     for (int32_t format : {0, 2}) {
-        const codec_config c = cfg(1, 2, format);
+        const codec_config c = dec_config(1, 2, format);
         ASSERT_EQ(vamrnbd_recon(s.data(), &c, &o.pcm), 0);
         EXPECT_EQ(o.pcm.samples[0], 320u);
         EXPECT_EQ(o.pcm.bytes[0], 640u);
@@ -70,7 +63,7 @@ TEST(DecoderOutput, TwoChannelsInterleavedRepeatEachSample) {
 TEST(DecoderOutput, SeparateBuffers) {
     Out o;
     auto s = ramp();
-    const codec_config one = cfg(0, 1, 0);
+    const codec_config one = dec_config(0, 1, 0);
     ASSERT_EQ(vamrnbd_recon(s.data(), &one, &o.pcm), 0);
     EXPECT_EQ(o.pcm.samples[1], 160u);
     EXPECT_EQ(o.pcm.samples[2], 160u);
@@ -80,7 +73,7 @@ TEST(DecoderOutput, SeparateBuffers) {
     EXPECT_EQ(o.ch2[0], 0xAA);  // second buffer only with two channels
     EXPECT_EQ(o.inter[0], 0xAA);
 
-    const codec_config two = cfg(7, 2, 0);  // any layout but 1 is separate
+    const codec_config two = dec_config(7, 2, 0);  // any layout but 1 is separate
     ASSERT_EQ(vamrnbd_recon(s.data(), &two, &o.pcm), 0);
     EXPECT_EQ(o.pcm.channels, 2u);
     EXPECT_EQ(o.pcm.layout, 7u);
@@ -95,7 +88,7 @@ TEST(DecoderOutput, EightBitSamplesRoundDownAndSaturate) {
     s[2] = 200;
     s[3] = -129;
     s[4] = 127;
-    const codec_config c = cfg(1, 1, 1);
+    const codec_config c = dec_config(1, 1, 1);
     ASSERT_EQ(vamrnbd_recon(s.data(), &c, &o.pcm), 0);
     EXPECT_EQ(o.pcm.bits_per_sample, 8u);
     EXPECT_EQ(o.pcm.bytes[0], 160u);
@@ -113,7 +106,7 @@ TEST(DecoderOutput, TwentyFourBitSamples) {
     std::vector<int16_t> s(160, 0);
     s[0] = 0x1234;
     s[1] = -1;
-    const codec_config c = cfg(1, 2, 3);
+    const codec_config c = dec_config(1, 2, 3);
     ASSERT_EQ(vamrnbd_recon(s.data(), &c, &o.pcm), 0);
     EXPECT_EQ(o.pcm.bits_per_sample, 24u);
     EXPECT_EQ(o.pcm.bytes[0], 960u);
@@ -123,8 +116,8 @@ TEST(DecoderOutput, TwentyFourBitSamples) {
 
 TEST(DecoderOutput, RefusedSettings) {
     auto s = ramp();
-    for (auto c : {cfg(1, 1, 4), cfg(1, 1, -1), cfg(1, 3, 0), cfg(1, -1, 0), cfg(1, 0, 1),
-                   cfg(1, 0, 3)}) {
+    for (auto c : {dec_config(1, 1, 4), dec_config(1, 1, -1), dec_config(1, 3, 0), dec_config(1, -1, 0), dec_config(1, 0, 1),
+                   dec_config(1, 0, 3)}) {
         Out o;
         EXPECT_EQ(vamrnbd_recon(s.data(), &c, &o.pcm), AMRNB_ERR_UNSUPPORTED)
             << c.dec.channels << " " << c.dec.sample_format;
@@ -132,7 +125,7 @@ TEST(DecoderOutput, RefusedSettings) {
     }
     // channel setting 0 is one channel for 16-bit output
     Out o;
-    const codec_config c = cfg(1, 0, 0);
+    const codec_config c = dec_config(1, 0, 0);
     EXPECT_EQ(vamrnbd_recon(s.data(), &c, &o.pcm), 0);
     EXPECT_EQ(o.pcm.channels, 1u);
 }

@@ -6,7 +6,7 @@
 #include <string>
 #include <vector>
 
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "format/frame_format.h"
 #include "vad/dtx_enc.h"
 #include "vad/sid_sync.h"

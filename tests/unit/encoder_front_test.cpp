@@ -7,7 +7,7 @@
 #include <memory>
 #include <vector>
 
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "lpc/tables.h"
 
 using namespace vamrnb;

@@ -8,7 +8,7 @@
 #include <random>
 #include <vector>
 
-#include "enc/enc_state.h"
+#include "common/enc_state.h"
 #include "vad/vad.h"
 
 using namespace vamrnb;

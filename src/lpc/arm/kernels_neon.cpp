@@ -2,19 +2,20 @@
 // multiply-accumulate (vqdmlal), saturating shift (vqshl) and rounding
 // saturating narrow (vqrshrn) are exactly the fixed-point steps of the
 // portable versions, lane by lane; four lanes carry four output samples.
-// Built only for ARM targets with NEON (the 32-bit ARM build requires it).
-#include "lpc/dsp.h"
+// Built only for ARM targets with NEON (the 32-bit ARM build requires it;
+// AArch64 always has it).
+#include "lpc/arm/dsp_arm.h"
 
 #if defined(VAMRNB_DSP_NEON)
 
-#include <arm_neon.h>
-
-#include "lpc/enc_kernels.h"
+#include "lpc/arm/simd_arm.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/syn_core.h"
 #include "lpc/tables.h"
 
 namespace vamrnb {
+using namespace arm;
 namespace {
 
 // Synthesis, four outputs per step (see the SSE4.1 version): the vector
@@ -34,12 +35,7 @@ inline void syn_run(const Word16 *a, const Word16 *x, Word16 *buf, Word32 *overf
         for (int i = 1; i <= M; ++i) s = vmlsq_s32(s, coef[i], vmovl_s16(vld1_s16(y - i)));
         int32_t p[4];
         vst1q_s32(p, s);
-        y[0] = Rule::out(p[0], overflow);
-        y[1] = Rule::out(wrap_sub(p[1], wrap_mul(a[1], y[0])), overflow);
-        y[2] = Rule::out(wrap_sub(p[2], wrap_add(wrap_mul(a[1], y[1]), wrap_mul(a[2], y[0]))), overflow);
-        y[3] = Rule::out(wrap_sub(p[3], wrap_add(wrap_add(wrap_mul(a[1], y[2]), wrap_mul(a[2], y[1])),
-                                                 wrap_mul(a[3], y[0]))),
-                         overflow);
+        syn::finish4<Rule>(a, p, y, overflow);
     }
 }
 
@@ -79,18 +75,8 @@ void pred_lt_3or6_neon(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
         pred_lt_3or6_c(T0, frac, flag3, exc);
         return;
     }
-    Word32 f = -frac;
-    if (flag3 != 0) f *= 2;
-    const Word16 *x0 = exc - T0;
-    if (f < 0) {
-        f += 6;
-        --x0;
-    }
     Word16 c1[10], c2[10];
-    for (int i = 0; i < 10; ++i) {
-        c1[i] = vamrnb_tbl_pred_inter_6[f + 6 * i];
-        c2[i] = vamrnb_tbl_pred_inter_6[6 - f + 6 * i];
-    }
+    const Word16 *x0 = enc_kernel::pred_lt_taps(T0, frac, flag3, exc, c1, c2);
     const int step = T0 >= 18 ? 8 : 4;
     for (int j = 0; j < L_SUBFR; j += step) {
         int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
@@ -120,8 +106,8 @@ Word32 energy_neon(const Word16 *x, Word32 n, Word32 init) {
     return vget_lane_s32(vqadd_s32(d, vrev64_s32(d)), 0);
 }
 
-// Exact sum when nothing can saturate (see the SSE4.1 version), otherwise
-// the portable sequential version.
+// The exact sum where the bound allows it (kernel_common.h), otherwise the
+// portable sequential version.
 Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 init) {
     if (n <= 0) return init;
     const Word32 n8 = n & ~7;
@@ -131,50 +117,15 @@ Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 ini
         const int16x8_t a = vld1q_s16(x + i), b = vld1q_s16(y + i);
         mx = vmaxq_u16(mx, vreinterpretq_u16_s16(vabsq_s16(a)));
         my = vmaxq_u16(my, vreinterpretq_u16_s16(vabsq_s16(b)));
-        acc = vmlal_s16(acc, vget_low_s16(a), vget_low_s16(b));
-        acc = vmlal_s16(acc, vget_high_s16(a), vget_high_s16(b));
+        acc = mla8(acc, a, b);
     }
     uint16_t ax[8], ay[8];
     int32_t sums[4];
     vst1q_u16(ax, mx);
     vst1q_u16(ay, my);
     vst1q_s32(sums, acc);
-    int64_t max_x = 0, max_y = 0;
-    for (int k = 0; k < 8; ++k) {
-        max_x = ax[k] > max_x ? ax[k] : max_x;
-        max_y = ay[k] > max_y ? ay[k] : max_y;
-    }
-    int64_t tail = 0;
-    for (Word32 i = n8; i < n; ++i) {
-        const int64_t px = x[i] < 0 ? -int64_t{x[i]} : x[i];
-        const int64_t py = y[i] < 0 ? -int64_t{y[i]} : y[i];
-        max_x = px > max_x ? px : max_x;
-        max_y = py > max_y ? py : max_y;
-        tail += int64_t{x[i]} * y[i];
-    }
-    const int64_t abs_init = init < 0 ? -int64_t{init} : init;
-    if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return inner_product_c(x, y, n, init);
-    const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
-    return static_cast<Word32>(init + 2 * total);
+    return enc_kernel::inner_product_finish(x, y, n, n8, init, ax, ay, sums, inner_product_c);
 }
-
-namespace {
-
-Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
-    int32x4_t acc = vdupq_n_s32(0);
-    Word32 j = 0;
-    for (; j + 8 <= n; j += 8) {
-        const int16x8_t a = vld1q_s16(x + j), b = vld1q_s16(y + j);
-        acc = vmlal_s16(acc, vget_low_s16(a), vget_low_s16(b));
-        acc = vmlal_s16(acc, vget_high_s16(a), vget_high_s16(b));
-    }
-    const int32x2_t p = vadd_s32(vget_low_s32(acc), vget_high_s32(acc));
-    int64_t s = int64_t{vget_lane_s32(p, 0)} + vget_lane_s32(p, 1);
-    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
-    return static_cast<Word32>(2 * s);
-}
-
-}  // namespace
 
 void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr) {
     enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
@@ -223,14 +174,6 @@ void cor_h_x_neon(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf) {
 }
 
 namespace {
-
-// Row sums of four squares for two rows held in one register.
-inline uint32x2_t row_sums(int16x8_t t) {
-    const uint32x4_t lo = vreinterpretq_u32_s32(vmull_s16(vget_low_s16(t), vget_low_s16(t)));
-    const uint32x4_t hi = vreinterpretq_u32_s32(vmull_s16(vget_high_s16(t), vget_high_s16(t)));
-    return vpadd_u32(vpadd_u32(vget_low_u32(lo), vget_high_u32(lo)),
-                     vpadd_u32(vget_low_u32(hi), vget_high_u32(hi)));
-}
 
 // Distances of four rows (two per register), saturated like the running sum;
 // vqdmulh is exactly mult().

@@ -1,60 +1,26 @@
-// AVX2 versions of the residual and fractional-delay kernels: eight 32-bit
-// lanes carry eight output samples, with the same lane-wise rebuilt
-// saturation as the SSE4.1 versions.  Called only when the processor
-// reports AVX2.
-#include "lpc/dsp.h"
+// AVX2 versions of the residual, fractional-delay and encoder correlation
+// kernels: eight 32-bit lanes carry eight output samples, with the same
+// lane-wise rebuilt saturation as the SSE4.1 versions (simd_x86.h).  Called
+// only when the processor reports AVX2 and SSE4.1 is allowed.
+#include "lpc/x86/dsp_x86.h"
 
 #if defined(VAMRNB_DSP_X86)
 
-#include <immintrin.h>
-
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/tables.h"
-
-#define VAMRNB_AVX2 __attribute__((target("avx2")))
+#include "lpc/x86/simd_x86.h"
 
 namespace vamrnb {
-namespace {
-
-VAMRNB_AVX2 inline __m256i sat_add(__m256i a, __m256i b) {
-    const __m256i s = _mm256_add_epi32(a, b);
-    const __m256i ovf = _mm256_and_si256(_mm256_xor_si256(s, a), _mm256_xor_si256(s, b));
-    const __m256i rail = _mm256_xor_si256(_mm256_srai_epi32(a, 31), _mm256_set1_epi32(0x7fffffff));
-    return _mm256_castps_si256(_mm256_blendv_ps(_mm256_castsi256_ps(s), _mm256_castsi256_ps(rail),
-                                                _mm256_castsi256_ps(ovf)));
-}
-
-VAMRNB_AVX2 inline __m256i dmul(__m256i a32, __m256i b32) {
-    const __m256i p = _mm256_mullo_epi32(a32, b32);
-    const __m256i sat = _mm256_cmpeq_epi32(p, _mm256_set1_epi32(0x40000000));
-    return _mm256_xor_si256(_mm256_add_epi32(p, p), sat);
-}
-
-VAMRNB_AVX2 inline __m256i load8(const Word16 *p) {
-    return _mm256_cvtepi16_epi32(_mm_loadu_si128(reinterpret_cast<const __m128i *>(p)));
-}
-
-VAMRNB_AVX2 inline void store_round8(Word16 *p, __m256i s) {
-    const __m256i r = _mm256_srai_epi32(sat_add(s, _mm256_set1_epi32(0x8000)), 16);
-    const __m128i packed = _mm_packs_epi32(_mm256_castsi256_si128(r), _mm256_extracti128_si256(r, 1));
-    _mm_storeu_si128(reinterpret_cast<__m128i *>(p), packed);
-}
-
-}  // namespace
+using namespace x86;
 
 VAMRNB_AVX2 void residu_avx2(const Word16 *a, const Word16 *x, Word16 *y) {
     __m256i coef[M + 1];
     for (int i = 0; i <= M; ++i) coef[i] = _mm256_set1_epi32(a[i]);
-    const __m256i hi = _mm256_set1_epi32(0x0FFFFFFF), lo = _mm256_set1_epi32(-0x10000000);
     for (int n = 0; n < L_SUBFR; n += 8) {
         __m256i s = dmul(load8(x + n), coef[0]);
         for (int i = 1; i <= M; ++i) s = sat_add(s, dmul(coef[i], load8(x + n - i)));
-        __m256i r = _mm256_slli_epi32(s, 3);
-        r = _mm256_blendv_epi8(r, _mm256_set1_epi32(0x7fffffff), _mm256_cmpgt_epi32(s, hi));
-        r = _mm256_blendv_epi8(r, _mm256_set1_epi32(static_cast<int>(0x80000000u)),
-                               _mm256_cmpgt_epi32(lo, s));
-        store_round8(y + n, r);
+        store_round(y + n, sat_shl3(s));
     }
 }
 
@@ -65,17 +31,12 @@ VAMRNB_AVX2 void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 
         pred_lt_3or6_c(T0, frac, flag3, exc);
         return;
     }
-    Word32 f = -frac;
-    if (flag3 != 0) f *= 2;
-    const Word16 *x0 = exc - T0;
-    if (f < 0) {
-        f += 6;
-        --x0;
-    }
+    Word16 t1[10], t2[10];
+    const Word16 *x0 = enc_kernel::pred_lt_taps(T0, frac, flag3, exc, t1, t2);
     __m256i c1[10], c2[10];
     for (int i = 0; i < 10; ++i) {
-        c1[i] = _mm256_set1_epi32(vamrnb_tbl_pred_inter_6[f + 6 * i]);
-        c2[i] = _mm256_set1_epi32(vamrnb_tbl_pred_inter_6[6 - f + 6 * i]);
+        c1[i] = _mm256_set1_epi32(t1[i]);
+        c2[i] = _mm256_set1_epi32(t2[i]);
     }
     for (int j = 0; j < L_SUBFR; j += 8) {
         __m256i s = _mm256_setzero_si256();
@@ -83,32 +44,13 @@ VAMRNB_AVX2 void pred_lt_3or6_avx2(Word32 T0, Word32 frac, Word32 flag3, Word16 
             s = sat_add(s, dmul(load8(x0 + j - i), c1[i]));
             s = sat_add(s, dmul(load8(x0 + j + 1 + i), c2[i]));
         }
-        store_round8(exc + j, s);
+        store_round(exc + j, s);
     }
 }
 
-namespace {
-
-VAMRNB_AVX2 Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
-    __m256i acc = _mm256_setzero_si256();
-    Word32 j = 0;
-    for (; j + 16 <= n; j += 16)
-        acc = _mm256_add_epi32(
-            acc, _mm256_madd_epi16(_mm256_loadu_si256(reinterpret_cast<const __m256i *>(x + j)),
-                                   _mm256_loadu_si256(reinterpret_cast<const __m256i *>(y + j))));
-    __m128i v = _mm_add_epi32(_mm256_castsi256_si128(acc), _mm256_extracti128_si256(acc, 1));
-    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(1, 0, 3, 2)));
-    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(2, 3, 0, 1)));
-    int64_t s = _mm_cvtsi128_si32(v);
-    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
-    return static_cast<Word32>(2 * s);
-}
-
-}  // namespace
-
 VAMRNB_AVX2 void comp_corr_avx2(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min,
                                 Word32 *corr) {
-    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
+    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact_avx2);
 }
 
 // Eight outputs per step (see the SSE4.1 version).
@@ -125,9 +67,7 @@ VAMRNB_AVX2 void convolve_avx2(const Word16 *x, const Word16 *h, Word16 *y) {
             const __m128i h0 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i));
             const __m128i h1 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i - 1));
             const __m256i hh = _mm256_set_m128i(_mm_unpackhi_epi16(h0, h1), _mm_unpacklo_epi16(h0, h1));
-            const int32_t xp = static_cast<int32_t>(static_cast<uint16_t>(x[i]) |
-                                                    (static_cast<uint32_t>(static_cast<uint16_t>(x[i + 1])) << 16));
-            acc = _mm256_add_epi32(acc, _mm256_madd_epi16(hh, _mm256_set1_epi32(xp)));
+            acc = _mm256_add_epi32(acc, _mm256_madd_epi16(hh, _mm256_set1_epi32(pair16(x[i], x[i + 1]))));
         }
         alignas(32) Word32 s[8];
         _mm256_store_si256(reinterpret_cast<__m256i *>(s), acc);
@@ -148,9 +88,7 @@ VAMRNB_AVX2 void cor_h_x_avx2(const Word16 *h, const Word16 *x, Word16 *dn, Word
                 const __m128i q0 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(q + 39 + i - j));
                 const __m128i q1 = _mm_loadu_si128(reinterpret_cast<const __m128i *>(q + 38 + i - j));
                 const __m256i qq = _mm256_set_m128i(_mm_unpackhi_epi16(q0, q1), _mm_unpacklo_epi16(q0, q1));
-                const int32_t xp = static_cast<int32_t>(static_cast<uint16_t>(x[j]) |
-                                                        (static_cast<uint32_t>(static_cast<uint16_t>(x[j + 1])) << 16));
-                acc = _mm256_add_epi32(acc, _mm256_madd_epi16(qq, _mm256_set1_epi32(xp)));
+                acc = _mm256_add_epi32(acc, _mm256_madd_epi16(qq, _mm256_set1_epi32(pair16(x[j], x[j + 1]))));
             }
             _mm256_storeu_si256(reinterpret_cast<__m256i *>(y + i), _mm256_slli_epi32(acc, 1));
         }

@@ -1,51 +1,21 @@
 // SSE4.1 versions of the subframe kernels.  Four 32-bit lanes carry four
 // output samples; the saturating 32-bit steps of the portable versions are
-// rebuilt lane by lane (SSE has no saturating 32-bit add), so every result is
-// bit for bit the portable one.  Compiled for any x86 target: the functions
-// carry their own target attribute and are only called when the processor
-// reports SSE4.1.
-#include "lpc/dsp.h"
+// rebuilt lane by lane (simd_x86.h), so every result is bit for bit the
+// portable one.  Compiled for any x86 target: the functions carry their own
+// target attribute and are only called when the processor reports SSE4.1.
+#include "lpc/x86/dsp_x86.h"
 
 #if defined(VAMRNB_DSP_X86)
 
-#include <immintrin.h>
-
-#include "lpc/enc_kernels.h"
+#include "lpc/kernel_common.h"
 #include "lpc/lpc.h"
 #include "lpc/syn_core.h"
 #include "lpc/tables.h"
-
-#define VAMRNB_SSE41 __attribute__((target("sse4.1")))
+#include "lpc/x86/simd_x86.h"
 
 namespace vamrnb {
+using namespace x86;
 namespace {
-
-// Saturating 32-bit add per lane.
-VAMRNB_SSE41 inline __m128i sat_add(__m128i a, __m128i b) {
-    const __m128i s = _mm_add_epi32(a, b);
-    const __m128i ovf = _mm_and_si128(_mm_xor_si128(s, a), _mm_xor_si128(s, b));
-    const __m128i rail = _mm_xor_si128(_mm_srai_epi32(a, 31), _mm_set1_epi32(0x7fffffff));
-    return _mm_castps_si128(_mm_blendv_ps(_mm_castsi128_ps(s), _mm_castsi128_ps(rail),
-                                          _mm_castsi128_ps(ovf)));
-}
-
-// 2·a·b with the one saturating case (-32768·-32768), from 16-bit lanes
-// already widened to 32 bits.
-VAMRNB_SSE41 inline __m128i dmul(__m128i a32, __m128i b32) {
-    const __m128i p = _mm_mullo_epi32(a32, b32);
-    const __m128i sat = _mm_cmpeq_epi32(p, _mm_set1_epi32(0x40000000));
-    return _mm_xor_si128(_mm_add_epi32(p, p), sat);
-}
-
-VAMRNB_SSE41 inline __m128i load4(const Word16 *p) {
-    return _mm_cvtepi16_epi32(_mm_loadl_epi64(reinterpret_cast<const __m128i *>(p)));
-}
-
-// round16 of four lanes, stored as four Word16.
-VAMRNB_SSE41 inline void store_round4(Word16 *p, __m128i s) {
-    const __m128i r = _mm_srai_epi32(sat_add(s, _mm_set1_epi32(0x8000)), 16);
-    _mm_storel_epi64(reinterpret_cast<__m128i *>(p), _mm_packs_epi32(r, r));
-}
 
 // Synthesis, four outputs per step: the part of each lane's sum that uses
 // outputs of earlier steps is formed in the vector (coefficients masked to
@@ -86,12 +56,7 @@ VAMRNB_SSE41 inline void syn_run(const Word16 *a, const Word16 *x, Word16 *buf, 
         s = _mm_sub_epi32(s, acc);
         alignas(16) Word32 p[4];
         _mm_store_si128(reinterpret_cast<__m128i *>(p), s);
-        y[0] = Rule::out(p[0], overflow);
-        y[1] = Rule::out(wrap_sub(p[1], wrap_mul(a[1], y[0])), overflow);
-        y[2] = Rule::out(wrap_sub(p[2], wrap_add(wrap_mul(a[1], y[1]), wrap_mul(a[2], y[0]))), overflow);
-        y[3] = Rule::out(wrap_sub(p[3], wrap_add(wrap_add(wrap_mul(a[1], y[2]), wrap_mul(a[2], y[1])),
-                                                 wrap_mul(a[3], y[0]))),
-                         overflow);
+        syn::finish4<Rule>(a, p, y, overflow);
     }
 }
 
@@ -112,15 +77,10 @@ VAMRNB_SSE41 void syn_filt_m_sse41(const Word16 *a, const Word16 *x, Word32 *ove
 VAMRNB_SSE41 void residu_sse41(const Word16 *a, const Word16 *x, Word16 *y) {
     __m128i coef[M + 1];
     for (int i = 0; i <= M; ++i) coef[i] = _mm_set1_epi32(a[i]);
-    const __m128i hi = _mm_set1_epi32(0x0FFFFFFF), lo = _mm_set1_epi32(-0x10000000);
     for (int n = 0; n < L_SUBFR; n += 4) {
         __m128i s = dmul(load4(x + n), coef[0]);
         for (int i = 1; i <= M; ++i) s = sat_add(s, dmul(coef[i], load4(x + n - i)));
-        // Saturating shift left by 3.
-        __m128i r = _mm_slli_epi32(s, 3);
-        r = _mm_blendv_epi8(r, _mm_set1_epi32(0x7fffffff), _mm_cmpgt_epi32(s, hi));
-        r = _mm_blendv_epi8(r, _mm_set1_epi32(static_cast<int>(0x80000000u)), _mm_cmplt_epi32(s, lo));
-        store_round4(y + n, r);
+        store_round(y + n, sat_shl3(s));
     }
 }
 
@@ -132,17 +92,12 @@ VAMRNB_SSE41 void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word1
         pred_lt_3or6_c(T0, frac, flag3, exc);
         return;
     }
-    Word32 f = -frac;
-    if (flag3 != 0) f *= 2;
-    const Word16 *x0 = exc - T0;
-    if (f < 0) {
-        f += 6;
-        --x0;
-    }
+    Word16 t1[10], t2[10];
+    const Word16 *x0 = enc_kernel::pred_lt_taps(T0, frac, flag3, exc, t1, t2);
     __m128i c1[10], c2[10];
     for (int i = 0; i < 10; ++i) {
-        c1[i] = _mm_set1_epi32(vamrnb_tbl_pred_inter_6[f + 6 * i]);
-        c2[i] = _mm_set1_epi32(vamrnb_tbl_pred_inter_6[6 - f + 6 * i]);
+        c1[i] = _mm_set1_epi32(t1[i]);
+        c2[i] = _mm_set1_epi32(t2[i]);
     }
     for (int j = 0; j < L_SUBFR; j += 4) {
         __m128i s = _mm_setzero_si128();
@@ -150,7 +105,7 @@ VAMRNB_SSE41 void pred_lt_3or6_sse41(Word32 T0, Word32 frac, Word32 flag3, Word1
             s = sat_add(s, dmul(load4(x0 + j - i), c1[i]));
             s = sat_add(s, dmul(load4(x0 + j + 1 + i), c2[i]));
         }
-        store_round4(exc + j, s);
+        store_round(exc + j, s);
     }
 }
 
@@ -168,9 +123,8 @@ VAMRNB_SSE41 Word32 energy_sse41(const Word16 *x, Word32 n, Word32 init) {
     return _mm_cvtsi128_si32(e);
 }
 
-// The running sum saturates nowhere when |init| plus the sum of all |terms|
-// fits in 32 bits; then it is the exact sum, formed with 16-bit pair products.
-// Otherwise the portable sequential version decides.
+// The exact sum with 16-bit pair products where the bound allows it
+// (kernel_common.h), otherwise the portable sequential version.
 VAMRNB_SSE41 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32 n, Word32 init) {
     if (n <= 0) return init;
     const Word32 n8 = n & ~7;
@@ -187,56 +141,12 @@ VAMRNB_SSE41 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32
     _mm_store_si128(reinterpret_cast<__m128i *>(ax), mx);
     _mm_store_si128(reinterpret_cast<__m128i *>(ay), my);
     _mm_store_si128(reinterpret_cast<__m128i *>(sums), acc);
-    int64_t max_x = 0, max_y = 0;
-    for (int k = 0; k < 8; ++k) {
-        max_x = ax[k] > max_x ? ax[k] : max_x;
-        max_y = ay[k] > max_y ? ay[k] : max_y;
-    }
-    int64_t tail = 0;
-    for (Word32 i = n8; i < n; ++i) {
-        const int64_t px = x[i] < 0 ? -int64_t{x[i]} : x[i];
-        const int64_t py = y[i] < 0 ? -int64_t{y[i]} : y[i];
-        max_x = px > max_x ? px : max_x;
-        max_y = py > max_y ? py : max_y;
-        tail += int64_t{x[i]} * y[i];
-    }
-    const int64_t abs_init = init < 0 ? -int64_t{init} : init;
-    if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return inner_product_c(x, y, n, init);
-    const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
-    return static_cast<Word32>(init + 2 * total);
+    return enc_kernel::inner_product_finish(x, y, n, n8, init, ax, ay, sums, inner_product_c);
 }
-
-namespace {
-
-VAMRNB_SSE41 inline int32_t hsum(__m128i v) {
-    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(1, 0, 3, 2)));
-    v = _mm_add_epi32(v, _mm_shuffle_epi32(v, _MM_SHUFFLE(2, 3, 0, 1)));
-    return _mm_cvtsi128_si32(v);
-}
-
-// 2·sum x·y in any order; only for sums known not to saturate.
-VAMRNB_SSE41 Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
-    __m128i acc = _mm_setzero_si128();
-    Word32 j = 0;
-    for (; j + 8 <= n; j += 8)
-        acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_loadu_si128(reinterpret_cast<const __m128i *>(x + j)),
-                                                _mm_loadu_si128(reinterpret_cast<const __m128i *>(y + j))));
-    int64_t s = hsum(acc);
-    for (; j < n; ++j) s += int64_t{x[j]} * y[j];
-    return static_cast<Word32>(2 * s);
-}
-
-// Pair (lo, hi) of 16-bit values replicated in every 32-bit lane.
-VAMRNB_SSE41 inline __m128i pair16(Word16 lo, Word16 hi) {
-    return _mm_set1_epi32(static_cast<int32_t>(static_cast<uint16_t>(lo) |
-                                               (static_cast<uint32_t>(static_cast<uint16_t>(hi)) << 16)));
-}
-
-}  // namespace
 
 VAMRNB_SSE41 void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min,
                                   Word32 *corr) {
-    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
+    enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact_sse41);
 }
 
 // Four outputs per step; h is read through a copy with 40 zeros in front so
@@ -253,7 +163,7 @@ VAMRNB_SSE41 void convolve_sse41(const Word16 *x, const Word16 *h, Word16 *y) {
         for (int i = 0; i <= n + 3 && i < L_SUBFR; i += 2) {
             const __m128i h0 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i));
             const __m128i h1 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(hp + L_SUBFR + n - i - 1));
-            acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_unpacklo_epi16(h0, h1), pair16(x[i], x[i + 1])));
+            acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_unpacklo_epi16(h0, h1), _mm_set1_epi32(pair16(x[i], x[i + 1]))));
         }
         alignas(16) Word32 s[4];
         _mm_store_si128(reinterpret_cast<__m128i *>(s), acc);
@@ -273,7 +183,7 @@ VAMRNB_SSE41 void cor_h_x_sse41(const Word16 *h, const Word16 *x, Word16 *dn, Wo
             for (int j = i & ~1; j < L_SUBFR; j += 2) {
                 const __m128i q0 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(q + 39 + i - j));
                 const __m128i q1 = _mm_loadl_epi64(reinterpret_cast<const __m128i *>(q + 38 + i - j));
-                acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_unpacklo_epi16(q0, q1), pair16(x[j], x[j + 1])));
+                acc = _mm_add_epi32(acc, _mm_madd_epi16(_mm_unpacklo_epi16(q0, q1), _mm_set1_epi32(pair16(x[j], x[j + 1]))));
             }
             _mm_storeu_si128(reinterpret_cast<__m128i *>(y + i), _mm_slli_epi32(acc, 1));
         }

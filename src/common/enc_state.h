@@ -5,6 +5,9 @@
 //
 // The public opaque handle `vamrnb_encoder` is the instance record itself;
 // inside the library it is spelt `vamrnb::enc_state`.
+//
+// The records live below both src/vad and src/enc: the detectors, the DTX
+// stage and the encoder stages all take them, and include them from above.
 #pragma once
 
 #include <cstdint>
@@ -14,9 +17,9 @@
 #include "basic_op/basic_op.h"
 #include "format/frame_format.h"
 #include "lpc/lpc.h"
-#include "enc/subframe_state.h"
-#include "vad/vad_state.h"
-#include "vad/dtx_enc.h"
+#include "common/subframe_state.h"
+#include "common/vad_state.h"
+#include "common/dtx_enc_state.h"
 
 namespace vamrnb {
 

@@ -1,5 +1,9 @@
-// Shared logic of the vector versions of the encoder's correlation kernels.
-// Those kernels accumulate with saturation in sequence; a vector version may
+// Shared logic of the vector versions of the kernels, for every
+// architecture: range bounds that let a vector sum in any order, the scalar
+// fallbacks for inputs that fail them, and the scalar set-up and finishing
+// steps around the vector loops.
+//
+// The correlation kernels accumulate with saturation in sequence; a vector version may
 // sum in any order only when no partial sum can reach the 32-bit rails.  By
 // Cauchy-Schwarz every partial sum of 2·x[j]·y[j] is bounded by
 // 2·sqrt(sum x^2 · sum y^2), so when 4·Ex·Ey stays below 2^62 - 2^33 the
@@ -9,6 +13,7 @@
 #include <cstdint>
 
 #include "basic_op/basic_op.h"
+#include "lpc/tables.h"
 
 namespace vamrnb::enc_kernel {
 
@@ -33,6 +38,34 @@ inline Word32 dot_sat(const Word16 *x, const Word16 *y, int n) {
     return t;
 }
 
+// ---- dot products with any summation order --------------------------------
+// inner_product's running sum saturates nowhere when |init| plus the sum of
+// all |terms| fits in 32 bits; then it is the exact sum.  A vector version
+// forms the exact sum of the first n8 samples in its lanes (`sums`) and the
+// lane maxima of |x| and |y| (`ax`, `ay`); this completes the tail and the
+// bound, and hands inputs that fail it to the sequential portable version.
+inline Word32 inner_product_finish(const Word16 *x, const Word16 *y, Word32 n, Word32 n8, Word32 init,
+                                   const uint16_t ax[8], const uint16_t ay[8], const int32_t sums[4],
+                                   Word32 (*sequential)(const Word16 *, const Word16 *, Word32, Word32)) {
+    int64_t max_x = 0, max_y = 0;
+    for (int k = 0; k < 8; ++k) {
+        max_x = ax[k] > max_x ? ax[k] : max_x;
+        max_y = ay[k] > max_y ? ay[k] : max_y;
+    }
+    int64_t tail = 0;
+    for (Word32 i = n8; i < n; ++i) {
+        const int64_t px = x[i] < 0 ? -int64_t{x[i]} : x[i];
+        const int64_t py = y[i] < 0 ? -int64_t{y[i]} : y[i];
+        max_x = px > max_x ? px : max_x;
+        max_y = py > max_y ? py : max_y;
+        tail += int64_t{x[i]} * y[i];
+    }
+    const int64_t abs_init = init < 0 ? -int64_t{init} : init;
+    if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return sequential(x, y, n, init);
+    const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
+    return static_cast<Word32>(init + 2 * total);
+}
+
 // Open-loop correlations: corr[-lag] for lag_max down to lag_min; exact_dot
 // forms 2·sum x·y without saturation (only called when that is safe).
 template <class ExactDot>
@@ -46,6 +79,27 @@ inline void comp_corr(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_mi
         // Window of the next (shorter) lag: drop x[-lag], take in x[len-lag].
         ed += int64_t{x[len - lag]} * x[len - lag] - int64_t{x[-lag]} * x[-lag];
     }
+}
+
+// ---- fractional delay -------------------------------------------------------
+// Start of the interpolation for delay T0 and fraction frac (1/3 grid when
+// flag3 is set, 1/6 otherwise): returns the past sample the first output is
+// centred on, and gives the ten taps applied backwards from it (c1) and the
+// ten applied forwards from the sample after it (c2), Q15.
+inline const Word16 *pred_lt_taps(Word32 T0, Word32 frac, Word32 flag3, const Word16 *exc, Word16 c1[10],
+                                  Word16 c2[10]) {
+    Word32 f = -frac;
+    if (flag3 != 0) f *= 2;   // 1/3 grid onto the 1/6 grid
+    const Word16 *x0 = exc - T0;
+    if (f < 0) {
+        f += 6;
+        --x0;
+    }
+    for (int i = 0; i < 10; ++i) {
+        c1[i] = vamrnb_tbl_pred_inter_6[f + 6 * i];
+        c2[i] = vamrnb_tbl_pred_inter_6[6 - f + 6 * i];
+    }
+    return x0;
 }
 
 // Convolution output of an exact sum: saturating shift by 3, high half.
