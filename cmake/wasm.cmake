@@ -1,0 +1,10 @@
+# Toolchain file for the WebAssembly build (web/): Debian's emscripten.
+#   cmake -S . -B build-wasm -DCMAKE_TOOLCHAIN_FILE=cmake/wasm.cmake
+# The library is built from the same sources with the portable kernels; the
+# JavaScript package's module is the target vamrnb_wasm.
+if(NOT DEFINED VAMRNB_EMSCRIPTEN_ROOT)
+  find_program(VAMRNB_EMCC emcc REQUIRED)
+  get_filename_component(VAMRNB_EMCC "${VAMRNB_EMCC}" REALPATH)
+  get_filename_component(VAMRNB_EMSCRIPTEN_ROOT "${VAMRNB_EMCC}" DIRECTORY)
+endif()
+include(${VAMRNB_EMSCRIPTEN_ROOT}/cmake/Modules/Platform/Emscripten.cmake)
