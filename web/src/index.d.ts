@@ -45,7 +45,9 @@ export interface EncodeOptions {
 
 /**
  * Encodes a recording to a .amr file ("#!AMR\n" and the frames); a last
- * partial frame is completed with silence.  Float32 samples are in -1..1.
+ * partial frame is completed with silence.  Float32 samples are in -1..1
+ * (negative ones scaled by 32768, positive ones by 32767, as browsers decode
+ * 16-bit audio files).
  */
 export function encode(samples: Int16Array | Float32Array, options?: EncodeOptions): Promise<Uint8Array>;
 

@@ -90,12 +90,16 @@ class Handle {
   }
 }
 
+// Float samples in -1..1 to 16 bits: negative values scaled by 32768,
+// positive ones by 32767, the inverse of how browsers decode 16-bit audio
+// files, so that a WAV file's samples come back exactly.
 function toInt16(samples) {
   if (samples instanceof Int16Array) return samples;
   if (samples instanceof Float32Array) {
     const out = new Int16Array(samples.length);
     for (let i = 0; i < samples.length; i++) {
-      const v = Math.round(samples[i] * 32768);
+      const x = samples[i];
+      const v = Math.round(x < 0 ? x * 32768 : x * 32767);
       out[i] = v > 32767 ? 32767 : v < -32768 ? -32768 : v;
     }
     return out;

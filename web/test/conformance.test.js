@@ -77,6 +77,6 @@ test('encode() pads a last partial frame and takes Float32 samples', async () =>
   // The reference stream, then one more frame for the padded remainder.
   assert.deepEqual(ours.subarray(0, expected.length), expected);
   assert.ok(ours.length > expected.length && ours.length <= expected.length + 32);
-  const float = Float32Array.from(pcm, (v) => v / 32768);
+  const float = Float32Array.from(pcm, (v) => (v < 0 ? v / 32768 : v / 32767));
   assert.deepEqual(await encode(float, { mode: r.mode, dtx: r.dtx, vad: r.vad }), ours);
 });
