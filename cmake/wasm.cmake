@@ -8,3 +8,6 @@ if(NOT DEFINED VAMRNB_EMSCRIPTEN_ROOT)
   get_filename_component(VAMRNB_EMSCRIPTEN_ROOT "${VAMRNB_EMCC}" DIRECTORY)
 endif()
 include(${VAMRNB_EMSCRIPTEN_ROOT}/cmake/Modules/Platform/Emscripten.cmake)
+# -O2: as fast as -O3 here (encode and decode within the measuring noise)
+# and 16% smaller (187 KB against 223 KB).
+set(CMAKE_CXX_FLAGS_RELEASE "-O2 -DNDEBUG" CACHE STRING "Release flags of the WebAssembly build")

@@ -53,10 +53,10 @@ test('bad arguments throw before any work', async () => {
 });
 
 test('many calls leave the heap as they found it', async () => {
-  const pcm = await decode(amr);
+  const pcm = (await decode(amr)).subarray(0, 8000);
   await encode(pcm, { dtx: true });  // first calls may grow the allocator's pools
   const before = heapInUse();
-  for (let i = 0; i < 200; i++) {
+  for (let i = 0; i < 48; i++) {
     await decode(amr);
     await encode(pcm, { mode: i % 8, dtx: i % 2 === 0, vad: 1 + (i % 3 === 0) });
     await assert.rejects(decode(bytes('not amr at all')));
