@@ -1,5 +1,6 @@
 # Toolchain file for the WebAssembly build (web/): Debian's emscripten.
-#   cmake -S . -B build-wasm -DCMAKE_TOOLCHAIN_FILE=cmake/wasm.cmake
+#   web/build.sh, or cmake -S . -B build-wasm -DCMAKE_TOOLCHAIN_FILE=cmake/wasm.cmake with
+#   the tests, tool, examples, Python and GStreamer parts switched off
 # The library is built from the same sources with the portable kernels; the
 # JavaScript package's module is the target vamrnb_wasm.
 if(NOT DEFINED VAMRNB_EMSCRIPTEN_ROOT)

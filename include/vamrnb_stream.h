@@ -1,5 +1,6 @@
-/*
- * vamrnb — AMR-NB storage-format streams (".amr" files).
+/**
+ * @file vamrnb_stream.h
+ * @brief vamrnb: AMR-NB storage-format streams (".amr" files).
  *
  * A storage-format stream is the magic "#!AMR\n" followed by frames, each a
  * table-of-contents byte and the frame's bits.  The reader takes bytes in any
@@ -30,7 +31,7 @@ extern "C" {
 /** Largest frame in a stream, table-of-contents byte included (MR122). */
 #define VAMRNB_STREAM_MAX_FRAME 32
 
-/*
+/**
  * Status values of the stream functions.  0 (AMRNB_OK) and AMRNB_ERR_NO_MEMORY
  * keep their library-wide meaning; the stream layer adds these, none of which
  * any other function of the library returns.  vamrnb_strerror() names them.

@@ -57,6 +57,108 @@ IF2 = {
 }
 
 
+# What each exported table holds, for its declaration in the public header.
+# Frame-type tables are indexed by the 4-bit frame type of the
+# table-of-contents byte (0-7 speech modes, 8 SID, 9-14 other, 15 no data).
+DOCS = {
+    "vamrnb_tbl_packed_size":
+        "Bytes of a whole storage-format frame, table-of-contents byte included, per frame\n"
+        "type 0..15 (13 for MR475 up to 32 for MR122, 6 for SID, 1 for no data; 0 for\n"
+        "types 12 to 14).  Read by the packer and by callers that walk a stream frame\n"
+        "by frame: the frame type is (toc >> 3) & 15.",
+    "vamrnb_tbl_prmno":
+        "Number of codec parameters per mode: rows MR475..MR122, MRDTX (SID) and a last\n"
+        "row 0 for no data.  Read by the parameter converters and the homing tests.",
+    "vamrnb_tbl_prmnofsf":
+        "Number of codec parameters up to and including the first subframe per mode\n"
+        "(MR475..MR122; the MRDTX row is 0).  Read by the first-subframe homing test.",
+    "vamrnb_tbl_toc_byte":
+        "Table-of-contents byte the encoder writes per frame type 0..15: the type in bits\n"
+        "6..3 and the quality bit Q (bit 2) set, i.e. (type << 3) | 4.",
+    "vamrnb_tbl_unpacked_size":
+        "Class bits (speech or SID parameter bits, without the SID type and mode bits) per\n"
+        "frame type 0..15: 95 for MR475 up to 244 for MR122, 35 for SID, 43/38/37 for\n"
+        "types 9 to 11, 0 for the rest.  Read by the packer and the unpacker.",
+    "vamrnb_tbl_unused_size":
+        "Zero padding bits that complete the last byte of a storage-format frame, per\n"
+        "frame type 0..15.  Read by the packer.",
+    "vamrnb_tbl_packed_size_IF2":
+        "Interface format 2: bytes of a frame after its first byte, per frame type 0..15.\n"
+        "Exported for callers; the library neither reads nor writes that format.",
+    "vamrnb_tbl_unused_size_IF2":
+        "Interface format 2: padding bits in the last byte, per frame type 0..15.\n"
+        "Exported for callers; the library neither reads nor writes that format.",
+    "vamrnb_tbl_bitno":
+        "Per mode (MR475..MR122, MRDTX) a table of the width in bits of each codec\n"
+        "parameter, vamrnb_tbl_prmno[mode] entries in parameter order; the tenth pointer\n"
+        "is null.  Read by the parameter/bit converters.",
+    "vamrnb_tbl_sort_ptr":
+        "Per frame type 0..8 the order in which the class bits travel: entry i is the\n"
+        "position, in the per-bit parameter vector, of the i-th bit of the frame\n"
+        "(vamrnb_tbl_unpacked_size[type] entries); null for types 9 to 15.  Read by the\n"
+        "packer and the unpacker.",
+    "vamrnb_tbl_dtx_log_en_adjust":
+        "Comfort-noise decoder: log-energy correction, Q11, per codec mode in which the\n"
+        "comfort noise is decoded (MR475..MR122, MRDTX).",
+    "vamrnbe_tbl_gamma1":
+        "Encoder perceptual weighting, numerator factors 0.94^(i+1), i = 0..9, Q15, for\n"
+        "every mode except MR102 and MR122.  Read by the open-loop pitch analysis and the\n"
+        "subframe weighting filters.",
+    "vamrnbe_tbl_f_gamma1":
+        "Encoder perceptual weighting, numerator factors 0.9^(i+1), i = 0..9, Q15, used\n"
+        "instead of vamrnbe_tbl_gamma1 for MR102 and MR122.",
+    "vamrnbe_tbl_gamma2":
+        "Encoder perceptual weighting, denominator factors 0.6^(i+1), i = 0..9, Q15, all\n"
+        "modes.",
+    "vamrnb_tbl_lsp_init_data":
+        "Line spectral pairs that encoder, decoder and the DTX histories start from after\n"
+        "creation or a reset, Q15 cosine domain, 10 entries.",
+    "vamrnb_tbl_cos_lsp_lsf":
+        "Cosine table cos(pi * i / 64), i = 0..64, Q15, for the conversions between line\n"
+        "spectral frequencies and pairs (vamrnb_sf_sp(), vamrnb_lsp_lsf()).",
+    "vamrnb_tbl_pred_inter_6":
+        "Interpolation filter of 1/6-sample resolution for the past excitation, 61 taps,\n"
+        "Q15.  Read by vamrnb_pred_lt_3or6() (adaptive codebook of both directions).",
+    "vamrnb_tbl_dico1_lsf":
+        "MR122 LSF split-matrix quantiser, split 1 (LSFs 1-2 of both half-frame vectors):\n"
+        "128 rows of 4, normalised frequency (Q15 of half the sampling rate).  Read by the\n"
+        "MR122 LSF quantiser and dequantiser.",
+    "vamrnb_tbl_dico2_lsf":
+        "MR122 LSF split-matrix quantiser, split 2 (LSFs 3-4): 256 rows of 4, same scale\n"
+        "as vamrnb_tbl_dico1_lsf.",
+    "vamrnb_tbl_dico3_lsf":
+        "MR122 LSF split-matrix quantiser, split 3 (LSFs 5-6): 256 rows of 4, same scale\n"
+        "as vamrnb_tbl_dico1_lsf.",
+    "vamrnb_tbl_dico4_lsf":
+        "MR122 LSF split-matrix quantiser, split 4 (LSFs 7-8): 256 rows of 4, same scale\n"
+        "as vamrnb_tbl_dico1_lsf.",
+    "vamrnb_tbl_dico5_lsf":
+        "MR122 LSF split-matrix quantiser, split 5 (LSFs 9-10): 64 rows of 4, same scale\n"
+        "as vamrnb_tbl_dico1_lsf.",
+    "vamrnb_tbl_mean_lsf":
+        "Mean LSF vector (10 entries, same scale as the LSF codebooks) removed before the\n"
+        "MR122 quantiser; also the start value of the decoder's LSF histories and of the\n"
+        "running LSF average.",
+    "vamrnb_tbl_qua_gain_code":
+        "Scalar code-gain quantiser of MR122 and MR795: 32 rows of (gain correction factor\n"
+        "Q11, quantised energy for the MR122 predictor Q10, for the other modes' predictor\n"
+        "Q10).",
+    "vamrnb_tbl_qua_gain_pitch":
+        "Scalar pitch-gain quantiser of MR122 and MR795 (and the decoder's pitch-gain\n"
+        "lookup of those modes): 16 gains, Q14.",
+    "vamrnb_tb1_gain_mr475":
+        "MR475 joint gain quantiser over a pair of subframes: 256 rows of (pitch gain Q14,\n"
+        "code-gain correction Q12) for the first and then the second subframe.",
+    "vamrnb_tbl_gain_highrates":
+        "Joint pitch and code gain quantiser of MR67, MR74 and MR102: 128 rows of (pitch\n"
+        "gain Q14, code-gain correction Q12, quantised energy for the MR122 predictor Q10,\n"
+        "for the other modes' predictor Q10).",
+    "vamrnb_tbl_gain_lowrates":
+        "Joint pitch and code gain quantiser of MR515 and MR59: 64 rows laid out like\n"
+        "vamrnb_tbl_gain_highrates.",
+}
+
+
 # Frame types 9 to 11 (the other systems' comfort-noise frames) have sizes in
 # the storage format although this codec reads none of their bits; the table
 # files leave them 0, which would stall a reader that walks a stream by size.
@@ -161,12 +263,21 @@ def main():
 
     # The public header declares the exported tables with default visibility.
     groups = (("format", "frame formats"), ("lpc", "LPC, gain and weighting tables"))
-    body = "".join(f"\n/* {title} */\n" + "".join(f"VAMRNB_API {d}\n" for g, d in exported if g == key)
+    def doc(decl):
+        name = decl.split("[")[0].split()[-1]
+        text = DOCS[name].replace("\n", "\n *  ")
+        return f"/** {text} */\n"
+
+    body = "".join(f"\n/* {title} */\n"
+                   + "".join(f"{doc(d)}VAMRNB_API {d}\n" for g, d in exported if g == key)
                    for key, title in groups)
     with open(os.path.join(ROOT, "include/vamrnb_tables.h"), "w") as f:
-        f.write("/*\n * vamrnb — constant tables exported with the library (read-only).\n"
-                " * Generated by scripts/gen_tables.py; do not edit by hand.  Compiles as C11\n"
-                " * and as C++17 on its own.\n */\n"
+        f.write("/**\n * @file vamrnb_tables.h\n"
+                " * @brief vamrnb: constant tables exported with the library (read-only).\n *\n"
+                " * Frame-format tables that describe every storage-format frame, and the\n"
+                " * LPC, gain and weighting tables the codec stages share.  Generated by\n"
+                " * scripts/gen_tables.py; do not edit by hand.  Compiles as C11 and as\n"
+                " * C++17 on its own.\n */\n"
                 "#ifndef VAMRNB_TABLES_H\n#define VAMRNB_TABLES_H\n\n#include <stdint.h>\n\n"
                 "#include \"vamrnb.h\"\n\n#ifdef __cplusplus\nextern \"C\" {\n#endif\n" + body
                 + "\n#ifdef __cplusplus\n}\n#endif\n\n#endif /* VAMRNB_TABLES_H */\n")

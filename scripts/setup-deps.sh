@@ -7,7 +7,14 @@ set -euo pipefail
 
 vamrnb_packages=(cmake g++ make pkg-config googletest libgtest-dev libbenchmark-dev
                  g++-arm-linux-gnueabihf qemu-user clang libsndfile1-dev libsoxr-dev
-                 python3 help2man emscripten chromium nodejs)
+                 python3 help2man doxygen abigail-tools
+                 tshark
+                 libgstreamer1.0-dev libgstreamer-plugins-base1.0-dev gstreamer1.0-tools
+                 gstreamer1.0-plugins-base gstreamer1.0-plugins-good
+                 python3-dev python3-numpy python3-pybind11 python3-pytest
+                 python3-setuptools python3-build python3-venv python3-mypy
+                 emscripten chromium nodejs
+)
 
 vamrnb_setup_deps() {
     if ! command -v dpkg-query >/dev/null 2>&1; then
@@ -34,6 +41,8 @@ vamrnb_setup_deps() {
     fi
     echo "setup: installing ${missing[*]}"
     export DEBIAN_FRONTEND=noninteractive
+    # tshark: no set-uid capture helper, and so no question during installation.
+    echo "wireshark-common wireshark-common/install-setuid boolean false" | debconf-set-selections
     apt-get update
     apt-get install -y "${missing[@]}"
     vamrnb_setup_web

@@ -10,6 +10,7 @@
 // cache and reads report 0xFFFFFFFF.
 #include <bit>
 
+#include "common/checks.h"
 #include "common/bitstream.h"
 
 namespace {
@@ -55,6 +56,8 @@ extern "C" {
 
 VAMRNB_API void vcmn_bsr_init(vcmn_bsr *bs, const uint8_t *buf, uint32_t size,
                               vcmn_bsr_refill_fn refill) {
+    VAMRNB_REQUIRE(bs);
+    VAMRNB_REQUIRE_WHEN(size > 0, buf, __func__);
     bs->cache = 0;
     bs->bits = 0;
     bs->ptr = buf;

@@ -8,6 +8,7 @@
 // writer moves to the next byte.  The end of the buffer is checked when an
 // operation starts: a multi-bit write that starts inside the buffer is
 // carried out in full.
+#include "common/checks.h"
 #include "common/bitstream.h"
 
 namespace {
@@ -30,6 +31,8 @@ void byte_done(vcmn_bsw *bs) {
 extern "C" {
 
 VAMRNB_API void vcmn_bsw_init(vcmn_bsw *bs, uint8_t *buf, uint32_t size, vcmn_bsw_byte_fn on_byte) {
+    VAMRNB_REQUIRE(bs);
+    VAMRNB_REQUIRE_WHEN(size > 0, buf, __func__);
     bs->ptr = buf;
     bs->start = buf;
     bs->free_bits = 8;

@@ -6,6 +6,7 @@
 // the running LSF average.
 #include <cstring>
 
+#include "common/checks.h"
 #include "dec/dec_state.h"
 #include "dec/dtx_dec.h"
 
@@ -162,6 +163,7 @@ extern "C" int32_t vamrnbd_lsp(dec_state *st, dec_work *w, const int16_t **curso
 }
 
 extern "C" vamrnb_decoder *vamrnbd_create(const codec_config *config, int32_t *error) {
+    VAMRNB_REQUIRE(config);
     auto *st = static_cast<dec_state *>(vcmn_malloc_align32(sizeof(dec_state)));
     if (st == nullptr) {
         if (error != nullptr) *error = AMRNB_ERR_NO_MEMORY;
@@ -187,6 +189,7 @@ extern "C" vamrnb_decoder *vamrnbd_create(const codec_config *config, int32_t *e
 }
 
 extern "C" void vamrnbd_reset(vamrnb_decoder *dec) {
+    VAMRNB_REQUIRE(dec);
     dec_state *st = as_state(dec);
     std::memset(&st->cn, 0, sizeof st->cn);
     reset_dec(st, 0);
@@ -201,6 +204,11 @@ extern "C" void vamrnbd_delete(vamrnb_decoder *dec) {
 
 extern "C" int32_t vamrnbd_decode(vamrnb_decoder *dec, const bitstream_buffer *in, pcm_buffer *out,
                                   frame_info *info) {
+    VAMRNB_REQUIRE(dec);
+    VAMRNB_REQUIRE(in);
+    VAMRNB_REQUIRE(in->data);
+    VAMRNB_REQUIRE(out);
+    VAMRNB_REQUIRE(info);
     dec_state *st = as_state(dec);
     dec_work *w = st->work;
     if (w == nullptr) return AMRNB_ERR_NO_MEMORY;

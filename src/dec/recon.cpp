@@ -4,6 +4,7 @@
 // caller configured, and fills in the output descriptor.
 #include <cstring>
 
+#include "common/checks.h"
 #include "dec/dec_state.h"
 
 using namespace vamrnb;
@@ -71,10 +72,13 @@ extern "C" int32_t vamrnbd_recon(int16_t samples[160], const codec_config *confi
     if (config->dec.layout == 1) {
         out->samples[0] = channels * L_FRAME;
         out->bytes[0] = bps / 8 * channels * L_FRAME;
+        VAMRNB_REQUIRE_WHEN(true, out->data[0], "vamrnbd_decode");
         write_samples(samples, format, static_cast<int>(channels), out->data[0]);
     } else {
         out->samples[1] = out->samples[2] = L_FRAME;
         out->bytes[1] = out->bytes[2] = bps / 8 * L_FRAME;
+        VAMRNB_REQUIRE_WHEN(true, out->data[1], "vamrnbd_decode");
+        VAMRNB_REQUIRE_WHEN(channels == 2, out->data[2], "vamrnbd_decode");
         write_samples(samples, format, 1, out->data[1]);
         if (channels == 2) write_samples(samples, format, 1, out->data[2]);
     }

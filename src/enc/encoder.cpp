@@ -4,6 +4,7 @@
 // frame type and packing the frame, and releasing the instance.
 #include <cstring>
 
+#include "common/checks.h"
 #include "enc/enc_state.h"
 #include "enc/subframe.h"
 #include "common/bitstream.h"
@@ -54,6 +55,7 @@ void init_state(enc_state *st) {
 }  // namespace
 
 extern "C" vamrnb_encoder *vamrnbe_create(const codec_config *config, int32_t *error) {
+    VAMRNB_REQUIRE(config);
     auto *st = static_cast<enc_state *>(vcmn_malloc_align32(sizeof(enc_state)));
     if (!st) {
         if (error) *error = AMRNB_ERR_NO_MEMORY;
@@ -83,6 +85,7 @@ extern "C" vamrnb_encoder *vamrnbe_create(const codec_config *config, int32_t *e
 }
 
 extern "C" int32_t vamrnbe_set_mode(vamrnb_encoder *enc, int32_t mode) {
+    VAMRNB_REQUIRE(enc);
     if (mode < MR475 || mode > MR122) return AMRNB_ERR_UNSUPPORTED;
     enc->config.enc.mode = mode;
     return AMRNB_OK;
@@ -90,6 +93,12 @@ extern "C" int32_t vamrnbe_set_mode(vamrnb_encoder *enc, int32_t mode) {
 
 extern "C" int32_t vamrnbe_encode(vamrnb_encoder *enc, const pcm_buffer *in,
                                   bitstream_buffer *out, frame_info *info) {
+    VAMRNB_REQUIRE(enc);
+    VAMRNB_REQUIRE(in);
+    VAMRNB_REQUIRE(in->data[0]);
+    VAMRNB_REQUIRE(out);
+    VAMRNB_REQUIRE(out->data);
+    VAMRNB_REQUIRE(info);
     enc_state *st = enc;
     enc_frame *fr = st->frame;
 

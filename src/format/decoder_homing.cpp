@@ -3,6 +3,7 @@
 // looks only at the parameters up to the end of the first subframe (enough
 // to decide early while the previous frame was already a homing frame), the
 // other at the whole frame.
+#include "common/checks.h"
 #include "format/frame_format.h"
 
 using namespace vamrnb;
@@ -27,11 +28,13 @@ int32_t homing_prefix_matches(const int16_t *serial, int32_t mode, int count) {
 extern "C" {
 
 VAMRNB_API int32_t vamrnbd_decoder_homing_frm_test_first(const int16_t *serial, int32_t mode) {
+    VAMRNB_REQUIRE(serial);
     if (mode < 0 || mode > 8) return 0;
     return homing_prefix_matches(serial, mode, vamrnb_tbl_prmnofsf[mode]);
 }
 
 VAMRNB_API int32_t vamrnbd_decoder_homing_frm_test(const int16_t *serial, int32_t mode) {
+    VAMRNB_REQUIRE(serial);
     if (mode < 0 || mode > 9) return 0;
     return homing_prefix_matches(serial, mode, vamrnb_tbl_prmno[mode]);
 }

@@ -5,6 +5,7 @@
 // through the bit-stream writer.
 #include <cstring>
 
+#include "common/checks.h"
 #include "format/frame_format.h"
 
 using namespace vamrnb;
@@ -15,6 +16,7 @@ extern "C" {
 // its first 244 entries hold their bits, each parameter most significant bit
 // first, and zeros after the last bit.
 VAMRNB_API void vamrnbe_prm2bits(int32_t mode, int16_t *prm) {
+    VAMRNB_REQUIRE(prm);
     Word16 bits[SERIAL_SIZE] = {};
     if (mode >= 0 && mode <= 9) {
         const int count = vamrnb_tbl_prmno[mode];
@@ -31,6 +33,9 @@ VAMRNB_API void vamrnbe_prm2bits(int32_t mode, int16_t *prm) {
 
 VAMRNB_API void vamrnbe_bs_pack(vcmn_bsw *writer, const int16_t *bits, int32_t mode,
                                 int32_t *used_mode, int32_t tx_type, const sid_sync_state *sid) {
+    VAMRNB_REQUIRE(writer);
+    VAMRNB_REQUIRE(bits);
+    VAMRNB_REQUIRE(used_mode);
     int32_t ft = *used_mode;
     if (ft < 0 || ft > FT_NO_DATA || (ft > FT_SID && ft < FT_NO_DATA)
         || (tx_type == TX_NO_DATA && ft == FT_SID)) {

@@ -2,6 +2,7 @@
 // table-of-contents byte, then the class bits in order of importance) from
 // the bit-stream reader, scatters the bits into `serial` in codec order and
 // classifies the frame; and converts `serial` into the parameter vector.
+#include "common/checks.h"
 #include "format/frame_format.h"
 
 using namespace vamrnb;
@@ -10,6 +11,10 @@ extern "C" {
 
 VAMRNB_API void vamrnbd_unpack_bits(vcmn_bsr *reader, rx_frame_class *cls, int32_t *mode,
                                     int16_t serial[250]) {
+    VAMRNB_REQUIRE(reader);
+    VAMRNB_REQUIRE(cls);
+    VAMRNB_REQUIRE(mode);
+    VAMRNB_REQUIRE(serial);
     const uint32_t toc = vcmn_bsr_read(reader, 8);
     const int ft = static_cast<int>((toc >> 3) & 15);
     cls->quality = static_cast<int32_t>((toc >> 2) & 1);
@@ -47,6 +52,8 @@ VAMRNB_API void vamrnbd_unpack_bits(vcmn_bsr *reader, rx_frame_class *cls, int32
 }
 
 VAMRNB_API void vamrnbd_bits2prm(int32_t mode, const int16_t *serial, int16_t *prm) {
+    VAMRNB_REQUIRE(serial);
+    VAMRNB_REQUIRE(prm);
     if (mode < 0 || mode > 9) return;
     const int count = vamrnb_tbl_prmno[mode];
     if (count < 1) return;
