@@ -31,8 +31,8 @@ extern "C" {
 /* ---- status codes ------------------------------------------------------ */
 enum {
     AMRNB_OK                 = 0,
-    AMRNB_ERR_NO_MEMORY      = -2, /* instance record could not be allocated */
-    AMRNB_ERR_UNSUPPORTED    = -3, /* reserved config word set, or output format refused */
+    AMRNB_ERR_NO_MEMORY      = -2, /* create: instance or working record could not be allocated */
+    AMRNB_ERR_UNSUPPORTED    = -3, /* reserved config word set, encoder mode not 0..7, or output format refused */
     AMRNB_ERR_BAD_FRAME_TYPE = -5, /* frame type 10, 11 (or above 15): nothing decoded */
     AMRNB_ERR_BAD_LAYOUT     = -8  /* output stage: channel setting not 0, 1 or 2 */
 };

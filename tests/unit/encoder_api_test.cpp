@@ -55,7 +55,7 @@ struct Encoder {
 
 }  // namespace
 
-TEST(EncApi, CreateRejectsReservedWordWithoutLeaking) {
+TEST(EncApi, CreateRefusesReservedWordAndModesOutsideRange) {
     codec_config c = config(0, MR122);
     c.enc.reserved = 5;
     int32_t err = 0;
@@ -63,6 +63,17 @@ TEST(EncApi, CreateRejectsReservedWordWithoutLeaking) {
     EXPECT_EQ(err, AMRNB_ERR_UNSUPPORTED);
     // The error pointer is optional.
     EXPECT_EQ(vamrnbe_create(&c, nullptr), nullptr);
+
+    // A mode with no frame layout is refused at creation, as by
+    // vamrnbe_set_mode, with DTX on or off.
+    for (int32_t mode : {-1, 8, 9, 15, 16, INT32_MIN, INT32_MAX}) {
+        for (int32_t dtx : {0, 1}) {
+            err = 0;
+            c = config(dtx, mode);
+            EXPECT_EQ(vamrnbe_create(&c, &err), nullptr) << mode;
+            EXPECT_EQ(err, AMRNB_ERR_UNSUPPORTED) << mode;
+        }
+    }
 
     codec_config ok = config(0, MR122);
     vamrnb_encoder *enc = vamrnbe_create(&ok, nullptr);
