@@ -104,22 +104,6 @@ private:
     uint8_t buf_[3][2 * 160 * 3] = {};
 };
 
-codec_config enc_config(int32_t dtx, int32_t vad_option, int32_t mode) {
-    codec_config c{};
-    c.enc.dtx = dtx;
-    c.enc.vad_option = vad_option;
-    c.enc.mode = mode;
-    return c;
-}
-
-codec_config dec_config(int32_t layout, int32_t channels, int32_t format) {
-    codec_config c{};
-    c.dec.layout = layout;
-    c.dec.channels = channels;
-    c.dec.sample_format = format;
-    return c;
-}
-
 struct Inputs {
     std::vector<std::vector<uint8_t>> files;
     void add(const std::string &path) {
@@ -131,12 +115,12 @@ struct Inputs {
 // The 16 jobs, encoders and decoders alternating.
 std::vector<std::unique_ptr<Job>> make_jobs(const std::vector<std::vector<uint8_t>> &f) {
     std::vector<std::unique_ptr<Job>> jobs;
-    const codec_config enc[8] = {enc_config(0, 0, MR122), enc_config(1, 0, MR475), enc_config(1, 1, MR795),
-                                 enc_config(0, 0, MR102), enc_config(1, 0, MR59),  enc_config(1, 1, MR67),
-                                 enc_config(1, 1, MR74),  enc_config(0, 0, MR515)};
-    const codec_config dec[8] = {dec_config(1, 1, 0), dec_config(1, 2, 0), dec_config(0, 1, 1),
-                                 dec_config(0, 2, 3), dec_config(1, 0, 0), dec_config(1, 2, 2),
-                                 dec_config(0, 1, 0), dec_config(1, 1, 3)};
+    // Encoders: {dtx, reserved, vad_option, mode}; decoders: {reserved,
+    // layout, channels, sample format}.
+    const codec_config enc[8] = {{{0, 0, 0, MR122}}, {{1, 0, 0, MR475}}, {{1, 0, 1, MR795}}, {{0, 0, 0, MR102}},
+                                 {{1, 0, 0, MR59}},  {{1, 0, 1, MR67}},  {{1, 0, 1, MR74}},  {{0, 0, 0, MR515}}};
+    const codec_config dec[8] = {{{0, 1, 1, 0}}, {{0, 1, 2, 0}}, {{0, 0, 1, 1}}, {{0, 0, 2, 3}},
+                                 {{0, 1, 0, 0}}, {{0, 1, 2, 2}}, {{0, 0, 1, 0}}, {{0, 1, 1, 3}}};
     const int item[8] = {0, 1, 0, 1, 2, 1, 0, 1};  // the 7-frame noise item once
     for (int i = 0; i < 8; ++i) {
         jobs.push_back(std::make_unique<EncodeJob>(f[item[i]], enc[i], i == 5));
