@@ -53,14 +53,26 @@ void agc(post_filter_state *st, const Word16 *in, Word16 *out) {
     st->past_gain = gain;
 }
 
+}  // namespace
+
+namespace vamrnb {
+
 // Output high-pass filter (second order, 60 Hz) with doubling of the signal.
 // The recursive part keeps its past outputs as (hi, lo) pairs.  With these
 // coefficients the feedback products and their sum cannot saturate, so they
-// are formed directly; the feed-forward terms and the output scaling keep
-// their saturation, taken on a slow path only when a sum leaves 32 bits.
+// are formed directly.
+//
+// The feed-forward terms are then added with 32-bit wrap-around.  The true
+// sum lies within +-3.56e9 (feedback at most 1.54e9 in size, feed-forward at
+// most 2 * 32768 * (7699 + 15398 + 7699) = 2.02e9), so a wrapped sum s with
+// |s| < 2^28 - 2^12 is the true sum.  Then no partial sum left 32 bits (the
+// last two terms are below 2^29 and 2^30 in size), s * 4 and s * 8 stay in
+// range and s * 8 + 0x8000 cannot overflow: the saturating chain gives s
+// itself.  Larger sums take the saturating chain.
 void post_process(post_filter_state *st, Word16 *sig) {
     const int32_t a1 = tab::post_pro_a[1], a2 = tab::post_pro_a[2];
     const int32_t b0 = tab::post_pro_b[0], b1 = tab::post_pro_b[1], b2 = tab::post_pro_b[2];
+    constexpr uint32_t SAFE = (1u << 28) - (1u << 12);
     int32_t y1_hi = st->y1_hi, y1_lo = st->y1_lo, y2_hi = st->y2_hi, y2_lo = st->y2_lo;
     int32_t x0 = st->x0, x1 = st->x1;
     for (int i = 0; i < L_FRAME; ++i) {
@@ -69,19 +81,20 @@ void post_process(post_filter_state *st, Word16 *sig) {
         x0 = sig[i];
         const int32_t fb = 2 * (y1_hi * a1 + ((y1_lo * a1) >> 15)) +
                            2 * (y2_hi * a2 + ((y2_lo * a2) >> 15));
-        const int64_t p1 = int64_t{fb} + 2 * x0 * b0;
-        const int64_t p2 = p1 + 2 * x1 * b1;
-        const int64_t p3 = p2 + 2 * x2 * b2;
+        const uint32_t wrapped = static_cast<uint32_t>(fb) + static_cast<uint32_t>(2 * x0 * b0) +
+                                 static_cast<uint32_t>(2 * x1 * b1) + static_cast<uint32_t>(2 * x2 * b2);
         Word32 L;
-        if (p1 == sat32(p1) && p2 == sat32(p2) && p3 == sat32(p3)) {
-            L = static_cast<Word32>(p3);
+        if (wrapped + SAFE < 2 * SAFE) {
+            L = static_cast<Word32>(wrapped);
+            sig[i] = static_cast<Word16>((L * 8 + 0x8000) >> 16);
+            L *= 4;
         } else {
             L = l_mac(l_mac(l_mac(fb, static_cast<Word16>(x0), static_cast<Word16>(b0)),
                             static_cast<Word16>(x1), static_cast<Word16>(b1)),
                       static_cast<Word16>(x2), static_cast<Word16>(b2));
+            L = sat32(int64_t{L} * 4);
+            sig[i] = round16(sat32(int64_t{L} * 2));
         }
-        L = sat32(int64_t{L} * 4);
-        sig[i] = round16(sat32(int64_t{L} * 2));
         y2_hi = y1_hi;
         y2_lo = y1_lo;
         y1_hi = L >> 16;
@@ -95,7 +108,8 @@ void post_process(post_filter_state *st, Word16 *sig) {
     st->x1 = static_cast<Word16>(x1);
 }
 
-}  // namespace
+}  // namespace vamrnb
+
 
 extern "C" void vamrnbd_post_filt(dec_state *st, dec_work *w, int32_t mode) {
     post_filter_state *pf = &st->post;
