@@ -76,17 +76,6 @@ bool scatter_whole(vcmn_bsr *bs, const int16_t *order, int nbits, int16_t *seria
     return true;
 }
 
-// `serial` entries equal to 1 packed most significant bit first; the bytes
-// after the last bit stay 0 so that a field can always be read as three.
-void pack_serial(const int16_t *serial, int n, uint8_t *packed) {
-    for (int j = 0; j < n; j += 8) {
-        const int16_t *s = serial + j;
-        packed[j / 8] = static_cast<uint8_t>(
-            (s[0] == 1) << 7 | (s[1] == 1) << 6 | (s[2] == 1) << 5 | (s[3] == 1) << 4 |
-            (s[4] == 1) << 3 | (s[5] == 1) << 2 | (s[6] == 1) << 1 | (s[7] == 1));
-    }
-}
-
 }  // namespace
 
 extern "C" {
@@ -143,23 +132,10 @@ VAMRNB_API void vamrnbd_bits2prm(int32_t mode, const int16_t *serial, int16_t *p
     const int count = vamrnb_tbl_prmno[mode];
     if (count < 1) return;
     const int16_t *width = vamrnb_tbl_bitno[mode];
-    int total = 0;
-    for (int j = 0; j < count; ++j) total += width[j];
-    // Whole groups of eight: the widths of every mode add up to at most
-    // MAX_FRAME_BITS, and the serial vector has room past its last bit.
-    uint8_t packed[MAX_PACKED_BYTES + 3] = {};
-    const int whole = total & ~7;
-    pack_serial(serial, whole, packed);
-    for (int i = whole; i < total; ++i)
-        packed[i / 8] = static_cast<uint8_t>(packed[i / 8] | (serial[i] == 1) << (7 - i % 8));
-    // Each field (at most 16 bits wide) lies within the three bytes from its first.
-    uint32_t pos = 0;
     for (int j = 0; j < count; ++j) {
-        const uint8_t *p = packed + pos / 8;
-        const uint32_t w3 = uint32_t{p[0]} << 16 | uint32_t{p[1]} << 8 | p[2];
-        const uint32_t w = static_cast<uint32_t>(width[j]);
-        prm[j] = static_cast<int16_t>((w3 >> (24u - pos % 8u - w)) & ((1u << w) - 1u));
-        pos += w;
+        uint32_t v = 0;
+        for (int b = 0; b < width[j]; ++b) v = (v << 1) | (*serial++ == 1 ? 1u : 0u);
+        prm[j] = static_cast<int16_t>(v);
     }
 }
 
