@@ -73,25 +73,29 @@ void post_process(post_filter_state *st, Word16 *sig) {
     const int32_t a1 = tab::post_pro_a[1], a2 = tab::post_pro_a[2];
     const int32_t b0 = tab::post_pro_b[0], b1 = tab::post_pro_b[1], b2 = tab::post_pro_b[2];
     constexpr uint32_t SAFE = (1u << 28) - (1u << 12);
+    // the input with its two past samples in front, and the feed-forward
+    // sums, which do not depend on the recursion (formed in one pass)
+    Word16 in[L_FRAME + 2];
+    in[0] = st->x1;
+    in[1] = st->x0;
+    std::memcpy(in + 2, sig, L_FRAME * sizeof(Word16));
+    uint32_t ff[L_FRAME];
+    for (int i = 0; i < L_FRAME; ++i)
+        ff[i] = static_cast<uint32_t>(2 * in[i + 2] * b0) + static_cast<uint32_t>(2 * in[i + 1] * b1) +
+                static_cast<uint32_t>(2 * in[i] * b2);
     int32_t y1_hi = st->y1_hi, y1_lo = st->y1_lo, y2_hi = st->y2_hi, y2_lo = st->y2_lo;
-    int32_t x0 = st->x0, x1 = st->x1;
     for (int i = 0; i < L_FRAME; ++i) {
-        const int32_t x2 = x1;
-        x1 = x0;
-        x0 = sig[i];
         const int32_t fb = 2 * (y1_hi * a1 + ((y1_lo * a1) >> 15)) +
                            2 * (y2_hi * a2 + ((y2_lo * a2) >> 15));
-        const uint32_t wrapped = static_cast<uint32_t>(fb) + static_cast<uint32_t>(2 * x0 * b0) +
-                                 static_cast<uint32_t>(2 * x1 * b1) + static_cast<uint32_t>(2 * x2 * b2);
+        const uint32_t wrapped = static_cast<uint32_t>(fb) + ff[i];
         Word32 L;
         if (wrapped + SAFE < 2 * SAFE) {
             L = static_cast<Word32>(wrapped);
             sig[i] = static_cast<Word16>((L * 8 + 0x8000) >> 16);
             L *= 4;
         } else {
-            L = l_mac(l_mac(l_mac(fb, static_cast<Word16>(x0), static_cast<Word16>(b0)),
-                            static_cast<Word16>(x1), static_cast<Word16>(b1)),
-                      static_cast<Word16>(x2), static_cast<Word16>(b2));
+            L = l_mac(l_mac(l_mac(fb, in[i + 2], static_cast<Word16>(b0)), in[i + 1], static_cast<Word16>(b1)),
+                      in[i], static_cast<Word16>(b2));
             L = sat32(int64_t{L} * 4);
             sig[i] = round16(sat32(int64_t{L} * 2));
         }
@@ -104,8 +108,8 @@ void post_process(post_filter_state *st, Word16 *sig) {
     st->y1_lo = static_cast<Word16>(y1_lo);
     st->y2_hi = static_cast<Word16>(y2_hi);
     st->y2_lo = static_cast<Word16>(y2_lo);
-    st->x0 = static_cast<Word16>(x0);
-    st->x1 = static_cast<Word16>(x1);
+    st->x0 = in[L_FRAME + 1];
+    st->x1 = in[L_FRAME];
 }
 
 }  // namespace vamrnb
