@@ -40,17 +40,19 @@ void agc(post_filter_state *st, const Word16 *in, Word16 *out) {
         st->past_gain = 0;
         return;
     }
-    const Word16 g0 = mult(agc_gain(s, in), sub(32767, AGC_FAC));
-    // smoothed gain per sample (never negative), then the scaling:
+    // The gain factor is never negative, so g0 <= 3275; a smoothed gain in
+    // 0 .. 32767 then stays there (at most 29490 + 3275), and the smoothing
+    // needs no saturation.
+    const int32_t g0 = mult(agc_gain(s, in), sub(32767, AGC_FAC));
+    // smoothed gain per sample, then the scaling:
     // extract_h(l_shl(l_mult(x, g), 3)) is x g shifted down by 12, saturated
-    Word16 gains[L_SUBFR];
-    Word16 gain = st->past_gain;
-    for (int i = 0; i < L_SUBFR; ++i) gains[i] = gain = add(mult(gain, AGC_FAC), g0);
+    int32_t gain = st->past_gain;
     for (int i = 0; i < L_SUBFR; ++i) {
-        const int32_t v = (int32_t{out[i]} * gains[i]) >> 12;
+        gain = ((gain * AGC_FAC) >> 15) + g0;
+        const int32_t v = (int32_t{out[i]} * gain) >> 12;
         out[i] = static_cast<Word16>(v > 32767 ? 32767 : (v < -32768 ? -32768 : v));
     }
-    st->past_gain = gain;
+    st->past_gain = static_cast<Word16>(gain);
 }
 
 }  // namespace
@@ -143,12 +145,17 @@ extern "C" void vamrnbd_post_filt(dec_state *st, dec_work *w, int32_t mode) {
         Word16 r1 = extract_h(L);
         r1 = r1 <= 0 ? 0 : div_s(mult(r1, MU), r0);
 
-        // tilt compensation 1 - r1 z^-1, run backwards in place
+        // tilt compensation 1 - r1 z^-1 on a copy with the memory in front;
+        // r1 is never negative, so its products need no saturation
         Word16 *res = pf->res2;
-        const Word16 last = res[L_SUBFR - 1];
-        for (int i = L_SUBFR - 1; i > 0; --i) res[i] = sub(res[i], mult(r1, res[i - 1]));
-        res[0] = sub(res[0], mult(r1, pf->mem_pre));
-        pf->mem_pre = last;
+        Word16 prev[L_SUBFR + 1];
+        prev[0] = pf->mem_pre;
+        std::memcpy(prev + 1, res, L_SUBFR * sizeof(Word16));
+        pf->mem_pre = res[L_SUBFR - 1];
+        for (int i = 0; i < L_SUBFR; ++i) {
+            const int32_t v = prev[i + 1] - ((int32_t{r1} * prev[i]) >> 15);
+            res[i] = static_cast<Word16>(v > 32767 ? 32767 : (v < -32768 ? -32768 : v));
+        }
 
         Word16 *out = w->out + i_subfr;
         vamrnb_syn_filt(Ap_den, res, pf->mem_syn_pst, out);
