@@ -40,48 +40,67 @@ void agc(post_filter_state *st, const Word16 *in, Word16 *out) {
         st->past_gain = 0;
         return;
     }
-    const Word16 g0 = mult(agc_gain(s, in), sub(32767, AGC_FAC));
-    // smoothed gain per sample (never negative), then the scaling:
+    // The gain factor is never negative, so g0 <= 3275; a smoothed gain in
+    // 0 .. 32767 then stays there (at most 29490 + 3275), and the smoothing
+    // needs no saturation.
+    const int32_t g0 = mult(agc_gain(s, in), sub(32767, AGC_FAC));
+    // smoothed gain per sample, then the scaling:
     // extract_h(l_shl(l_mult(x, g), 3)) is x g shifted down by 12, saturated
-    Word16 gains[L_SUBFR];
-    Word16 gain = st->past_gain;
-    for (int i = 0; i < L_SUBFR; ++i) gains[i] = gain = add(mult(gain, AGC_FAC), g0);
+    int32_t gain = st->past_gain;
     for (int i = 0; i < L_SUBFR; ++i) {
-        const int32_t v = (int32_t{out[i]} * gains[i]) >> 12;
+        gain = ((gain * AGC_FAC) >> 15) + g0;
+        const int32_t v = (int32_t{out[i]} * gain) >> 12;
         out[i] = static_cast<Word16>(v > 32767 ? 32767 : (v < -32768 ? -32768 : v));
     }
-    st->past_gain = gain;
+    st->past_gain = static_cast<Word16>(gain);
 }
+
+}  // namespace
+
+namespace vamrnb {
 
 // Output high-pass filter (second order, 60 Hz) with doubling of the signal.
 // The recursive part keeps its past outputs as (hi, lo) pairs.  With these
 // coefficients the feedback products and their sum cannot saturate, so they
-// are formed directly; the feed-forward terms and the output scaling keep
-// their saturation, taken on a slow path only when a sum leaves 32 bits.
+// are formed directly.
+//
+// The feed-forward terms are then added with 32-bit wrap-around.  The true
+// sum lies within +-3.56e9 (feedback at most 1.54e9 in size, feed-forward at
+// most 2 * 32768 * (7699 + 15398 + 7699) = 2.02e9), so a wrapped sum s with
+// |s| < 2^28 - 2^12 is the true sum.  Then no partial sum left 32 bits (the
+// last two terms are below 2^29 and 2^30 in size), s * 4 and s * 8 stay in
+// range and s * 8 + 0x8000 cannot overflow: the saturating chain gives s
+// itself.  Larger sums take the saturating chain.
 void post_process(post_filter_state *st, Word16 *sig) {
     const int32_t a1 = tab::post_pro_a[1], a2 = tab::post_pro_a[2];
     const int32_t b0 = tab::post_pro_b[0], b1 = tab::post_pro_b[1], b2 = tab::post_pro_b[2];
+    constexpr uint32_t SAFE = (1u << 28) - (1u << 12);
+    // the input with its two past samples in front, and the feed-forward
+    // sums, which do not depend on the recursion (formed in one pass)
+    Word16 in[L_FRAME + 2];
+    in[0] = st->x1;
+    in[1] = st->x0;
+    std::memcpy(in + 2, sig, L_FRAME * sizeof(Word16));
+    uint32_t ff[L_FRAME];
+    for (int i = 0; i < L_FRAME; ++i)
+        ff[i] = static_cast<uint32_t>(2 * in[i + 2] * b0) + static_cast<uint32_t>(2 * in[i + 1] * b1) +
+                static_cast<uint32_t>(2 * in[i] * b2);
     int32_t y1_hi = st->y1_hi, y1_lo = st->y1_lo, y2_hi = st->y2_hi, y2_lo = st->y2_lo;
-    int32_t x0 = st->x0, x1 = st->x1;
     for (int i = 0; i < L_FRAME; ++i) {
-        const int32_t x2 = x1;
-        x1 = x0;
-        x0 = sig[i];
         const int32_t fb = 2 * (y1_hi * a1 + ((y1_lo * a1) >> 15)) +
                            2 * (y2_hi * a2 + ((y2_lo * a2) >> 15));
-        const int64_t p1 = int64_t{fb} + 2 * x0 * b0;
-        const int64_t p2 = p1 + 2 * x1 * b1;
-        const int64_t p3 = p2 + 2 * x2 * b2;
+        const uint32_t wrapped = static_cast<uint32_t>(fb) + ff[i];
         Word32 L;
-        if (p1 == sat32(p1) && p2 == sat32(p2) && p3 == sat32(p3)) {
-            L = static_cast<Word32>(p3);
+        if (wrapped + SAFE < 2 * SAFE) {
+            L = static_cast<Word32>(wrapped);
+            sig[i] = static_cast<Word16>((L * 8 + 0x8000) >> 16);
+            L *= 4;
         } else {
-            L = l_mac(l_mac(l_mac(fb, static_cast<Word16>(x0), static_cast<Word16>(b0)),
-                            static_cast<Word16>(x1), static_cast<Word16>(b1)),
-                      static_cast<Word16>(x2), static_cast<Word16>(b2));
+            L = l_mac(l_mac(l_mac(fb, in[i + 2], static_cast<Word16>(b0)), in[i + 1], static_cast<Word16>(b1)),
+                      in[i], static_cast<Word16>(b2));
+            L = sat32(int64_t{L} * 4);
+            sig[i] = round16(sat32(int64_t{L} * 2));
         }
-        L = sat32(int64_t{L} * 4);
-        sig[i] = round16(sat32(int64_t{L} * 2));
         y2_hi = y1_hi;
         y2_lo = y1_lo;
         y1_hi = L >> 16;
@@ -91,11 +110,12 @@ void post_process(post_filter_state *st, Word16 *sig) {
     st->y1_lo = static_cast<Word16>(y1_lo);
     st->y2_hi = static_cast<Word16>(y2_hi);
     st->y2_lo = static_cast<Word16>(y2_lo);
-    st->x0 = static_cast<Word16>(x0);
-    st->x1 = static_cast<Word16>(x1);
+    st->x0 = in[L_FRAME + 1];
+    st->x1 = in[L_FRAME];
 }
 
-}  // namespace
+}  // namespace vamrnb
+
 
 extern "C" void vamrnbd_post_filt(dec_state *st, dec_work *w, int32_t mode) {
     post_filter_state *pf = &st->post;
@@ -125,12 +145,17 @@ extern "C" void vamrnbd_post_filt(dec_state *st, dec_work *w, int32_t mode) {
         Word16 r1 = extract_h(L);
         r1 = r1 <= 0 ? 0 : div_s(mult(r1, MU), r0);
 
-        // tilt compensation 1 - r1 z^-1, run backwards in place
+        // tilt compensation 1 - r1 z^-1 on a copy with the memory in front;
+        // r1 is never negative, so its products need no saturation
         Word16 *res = pf->res2;
-        const Word16 last = res[L_SUBFR - 1];
-        for (int i = L_SUBFR - 1; i > 0; --i) res[i] = sub(res[i], mult(r1, res[i - 1]));
-        res[0] = sub(res[0], mult(r1, pf->mem_pre));
-        pf->mem_pre = last;
+        Word16 prev[L_SUBFR + 1];
+        prev[0] = pf->mem_pre;
+        std::memcpy(prev + 1, res, L_SUBFR * sizeof(Word16));
+        pf->mem_pre = res[L_SUBFR - 1];
+        for (int i = 0; i < L_SUBFR; ++i) {
+            const int32_t v = prev[i + 1] - ((int32_t{r1} * prev[i]) >> 15);
+            res[i] = static_cast<Word16>(v > 32767 ? 32767 : (v < -32768 ? -32768 : v));
+        }
 
         Word16 *out = w->out + i_subfr;
         vamrnb_syn_filt(Ap_den, res, pf->mem_syn_pst, out);

@@ -23,4 +23,7 @@ struct bgn_scd_state {
     Word16 bgHangover;          // frames since the last speech-like frame
 };
 
+// Output high-pass filter with doubling, in place on one frame (160 samples).
+void post_process(post_filter_state *st, Word16 *sig);
+
 }  // namespace vamrnb

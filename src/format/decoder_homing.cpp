@@ -11,15 +11,18 @@ using namespace vamrnb;
 namespace {
 
 // 1 when the first `count` parameters of `serial` (mode 0..7) equal the
-// homing pattern.
+// homing pattern.  Each parameter is read only when all before it matched,
+// so that a speech frame is usually rejected after its first one.
 int32_t homing_prefix_matches(const int16_t *serial, int32_t mode, int count) {
     if (count < 1) return 1;
     if (mode < 0 || mode > 7) return 0;
-    Word16 prm[MAX_PRM];
-    vamrnbd_bits2prm(mode, serial, prm);
+    const int16_t *width = vamrnb_tbl_bitno[mode];
     const int16_t *pattern = tab::homing_frame_params[mode];
-    for (int j = 0; j < count; ++j)
-        if (prm[j] != pattern[j]) return 0;
+    for (int j = 0; j < count; ++j) {
+        int32_t v = 0;
+        for (int b = 0; b < width[j]; ++b) v = (v << 1) | (*serial++ == 1 ? 1 : 0);
+        if (v != pattern[j]) return 0;
+    }
     return 1;
 }
 

@@ -13,10 +13,9 @@ namespace vamrnb {
 VAMRNB_DECL_KERNELS(sse41)
 VAMRNB_DECL_KERNELS(avx2)
 
-// The plain synthesis keeps its portable version at every level: its
-// critical path is the output-to-output chain, which vectors do not shorten.
 inline void dsp_init_x86(DspKernels &c, uint32_t flags) {
     if (!(flags & kCpuSse41)) return;
+    c.syn_filt = syn_filt_sse41;
     c.syn_filt_m = syn_filt_m_sse41;
     c.residu = residu_sse41;
     c.pred_lt_3or6 = pred_lt_3or6_sse41;
