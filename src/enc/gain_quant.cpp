@@ -12,6 +12,9 @@
 
 #include "enc/subframe.h"
 
+#include <algorithm>
+#include <cstdlib>
+
 #include "basic_op/ext_op.h"
 #include "lpc/tables.h"
 #include "vamrnb_dsp.h"
@@ -192,6 +195,62 @@ Word16 max_plus_one(const Word16 *v, int n) {
     return add(m, 1);
 }
 
+// The gain searches score every table row by terms mpy_32_16(hi, lo, g)
+// summed with saturation, where g is a gain product and lo (the low half of
+// l_extract) lies in [0, 32767].  Such a term is 2*(hi*g + (lo*g >> 15))
+// with |term| <= 2*(|hi| + 1)*|g|, and the pitch and code gains are
+// non-negative, so mult() of them is (a*b) >> 15.  When these bounds, with g
+// at its largest over the table, show that no partial sum can leave 32 bits
+// the score is the plain integer sum, formed in any order.
+struct gain_bounds {
+    int32_t pitch, code;   // largest pitch gain and code factor of a table
+};
+
+gain_bounds table_bounds(const int16_t *tbl, int rows, int col_pitch, int col_code) {
+    gain_bounds b{0, 0};
+    for (int i = 0; i < rows; ++i) {
+        const int16_t *row = tbl + 4 * i;
+        b.pitch = std::max(b.pitch, std::abs(int32_t{row[col_pitch]}));
+        b.code = std::max(b.code, std::abs(int32_t{row[col_code]}));
+    }
+    return b;
+}
+
+// Largest magnitudes of the five gain products of one subframe, in the
+// order of the coefficients: g_pitch^2, g_pitch, g_code^2, g_code, g_pitch*g_code.
+void gain_product_bounds(gain_bounds b, Word16 gcode0, int64_t *g) {
+    const int64_t gc = ((b.code * int64_t{gcode0}) >> 15) + 1;
+    g[0] = ((int64_t{b.pitch} * b.pitch) >> 15) + 1;
+    g[1] = b.pitch;
+    g[2] = ((gc * gc) >> 15) + 1;
+    g[3] = gc;
+    g[4] = ((gc * b.pitch) >> 15) + 1;
+}
+
+// With g >= 0 a term has the sign of hi (for hi < 0, lo*g >> 15 < g <= -hi*g),
+// so every partial sum, also halfway through a term, lies between the sum
+// of the negative terms' bounds and that of the positive ones.
+bool terms_fit(const Word16 *hi, const int64_t *g, int n) {
+    int64_t pos = 0, neg = 0;
+    for (int k = 0; k < n; ++k) {
+        if (hi[k] >= 0) {
+            pos += 2 * (int64_t{hi[k]} + 1) * g[k];
+        } else {
+            neg -= 2 * int64_t{hi[k]} * g[k];
+        }
+    }
+    return pos <= MAX_32 && -neg >= MIN_32;
+}
+
+// One subframe's share of a row's score in plain arithmetic (see above).
+inline int32_t row_score(const Word16 *hi, const Word16 *lo, int32_t g_pitch, int32_t g_code) {
+    const int32_t g[5] = {(g_pitch * g_pitch) >> 15, g_pitch, (g_code * g_code) >> 15, g_code,
+                          (g_code * g_pitch) >> 15};
+    int32_t s = 0;
+    for (int k = 0; k < 5; ++k) s += hi[k] * g[k] + ((lo[k] * g[k]) >> 15);
+    return 2 * s;
+}
+
 // Joint pitch/code gain VQ of MR515, MR59, MR67, MR74 and MR102.
 Word16 qua_gain(int32_t mode, Word16 exp_gcode0, Word16 frac_gcode0, const Word16 *frac_coeff,
                 const Word16 *exp_coeff, Word16 gp_limit, Word16 *gain_pit, Word16 *gain_cod,
@@ -210,7 +269,21 @@ Word16 qua_gain(int32_t mode, Word16 exp_gcode0, Word16 frac_gcode0, const Word1
 
     Word32 dist_min = MAX_32;
     Word16 index = 0;
-    for (int i = 0; i < n_rows; ++i) {
+    static const gain_bounds bounds[2] = {table_bounds(vamrnb_tbl_gain_highrates, 128, 0, 1),
+                                          table_bounds(vamrnb_tbl_gain_lowrates, 64, 0, 1)};
+    int64_t g_max[5];
+    gain_product_bounds(bounds[n_rows == 128 ? 0 : 1], gcode0, g_max);
+    const bool plain = terms_fit(coeff, g_max, 5);
+    for (int i = 0; plain && i < n_rows; ++i) {
+        const int16_t *row = tbl + 4 * i;
+        if (row[0] > gp_limit) continue;
+        const int32_t L = row_score(coeff, coeff_lo, row[0], (row[1] * gcode0) >> 15);
+        if (L < dist_min) {
+            dist_min = L;
+            index = static_cast<Word16>(i);
+        }
+    }
+    for (int i = 0; !plain && i < n_rows; ++i) {
         const int16_t *row = tbl + 4 * i;
         const Word16 g_pitch = row[0];
         if (g_pitch > gp_limit) continue;
@@ -308,7 +381,23 @@ Word16 mr475_gain_quant(subfr_state &ss, const Word16 *sf1_code, Word16 sf1_exp_
     Word32 dist_min = MAX_32;
     Word16 index = 0;
     const int16_t *tbl = vamrnb_tb1_gain_mr475;
-    for (int i = 0; i < VQ_ROWS_MR475; ++i) {
+    static const gain_bounds b0 = table_bounds(tbl, VQ_ROWS_MR475, 0, 1);
+    static const gain_bounds b1 = table_bounds(tbl, VQ_ROWS_MR475, 2, 3);
+    int64_t g_max[10];
+    gain_product_bounds(b0, sf0_gcode0, g_max);
+    gain_product_bounds(b1, sf1_gcode0, g_max + 5);
+    const bool plain = terms_fit(coeff, g_max, 10);
+    for (int i = 0; plain && i < VQ_ROWS_MR475; ++i) {
+        const int16_t *row = tbl + 4 * i;
+        if (row[0] > gp_limit || row[2] > gp_limit) continue;
+        const int32_t L = row_score(coeff, coeff_lo, row[0], (row[1] * sf0_gcode0) >> 15) +
+                          row_score(coeff + 5, coeff_lo + 5, row[2], (row[3] * sf1_gcode0) >> 15);
+        if (L < dist_min) {
+            dist_min = L;
+            index = static_cast<Word16>(i);
+        }
+    }
+    for (int i = 0; !plain && i < VQ_ROWS_MR475; ++i) {
         const int16_t *row = tbl + 4 * i;
         // Rows whose pitch gain exceeds the limit in either subframe are out.
         if (row[0] > gp_limit || row[2] > gp_limit) continue;
