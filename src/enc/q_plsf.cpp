@@ -20,10 +20,15 @@ inline Word32 wdist(Word32 acc, Word16 w, Word16 diff) {
     return l_mac(acc, t, t);
 }
 
-// Weighted square of one component, not yet doubled: t = mult(w, diff)
-// has |t| <= 32768, so t*t <= 2^30 and three of them fit in 32 unsigned bits.
-inline uint32_t wsq(Word16 w, Word16 diff) {
-    const int32_t t = mult(w, diff);
+// Weighted square of one component, not yet doubled: t = mult(w, r - c)
+// with the difference saturated to 16 bits.  |t| <= 32768 (mult saturates
+// only the product of two -32768s, to 32767), so t*t <= 2^30 and three of
+// them fit in 32 unsigned bits.
+inline uint32_t wsq(int32_t w, int32_t r, int32_t c) {
+    int32_t d = r - c;
+    d = d > MAX_16 ? MAX_16 : d < MIN_16 ? MIN_16 : d;
+    int32_t t = (w * d) >> 15;
+    t = t > MAX_16 ? MAX_16 : t;
     return static_cast<uint32_t>(t * t);
 }
 
@@ -44,8 +49,7 @@ Word16 vq_subvec3(Word16 *r, const Word16 *dico, const Word16 *w, int rows, int 
     const Word16 w0 = w[0], w1 = w[1], w2 = w[2];
     const Word16 *row = dico;
     for (int i = 0; i < rows; ++i, row += 3 * stride) {
-        const uint32_t d = wsq(w0, sub(r0, row[0])) + wsq(w1, sub(r1, row[1])) +
-                           wsq(w2, sub(r2, row[2]));
+        const uint32_t d = wsq(w0, r0, row[0]) + wsq(w1, r1, row[1]) + wsq(w2, r2, row[2]);
         if (d < best) {
             best = d;
             index = i;
