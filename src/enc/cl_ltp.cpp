@@ -382,8 +382,12 @@ void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t
         scaling = 2;
     }
 
-    Word32 energy[CORR_MAX], dot[CORR_MAX];
+    // Any range within the excitation history (lags up to PIT_MAX plus the
+    // interpolator's margin) fits; the searches use at most CORR_MAX lags.
+    constexpr int kMaxLags = PIT_MAX + 2 * INTER_TAPS + 1;
+    Word32 energy[kMaxLags], dot[kMaxLags];
     const Word32 n_lags = t_max - t_min + 1;
+    if (n_lags <= 0 || n_lags > kMaxLags) return;
     dsp().norm_corr_sums(excf, xn, h, exc - t_min - 1, n_lags, scaling, energy, dot);
     for (Word32 i = 0; i < n_lags; ++i) {
         Word16 norm_h, norm_l_, corr_h, corr_l;
