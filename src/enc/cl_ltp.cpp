@@ -183,19 +183,6 @@ inline Word32 energy_from(int64_t sum_sq) {
     return sum_sq > (MAX_32 >> 1) ? MAX_32 : static_cast<Word32>(2 * sum_sq);
 }
 
-// The saturating accumulation of 2*x[j]*y[j] from 0.  When the energies
-// guarantee that no partial sum reaches the rails (Cauchy-Schwarz) the
-// plain sum is the same and may be formed in any order.
-inline Word32 dot_from(const Word16 *x, const Word16 *y, int64_t ex, int64_t ey) {
-    Word32 s = 0;
-    if (enc_kernel::no_saturation(ex, ey)) {
-        for (int j = 0; j < L_SUBFR; ++j) s += 2 * (int32_t{x[j]} * y[j]);
-    } else {
-        for (int j = 0; j < L_SUBFR; ++j) s = l_mac(s, x[j], y[j]);
-    }
-    return s;
-}
-
 // One saturating multiply-accumulate that also reports saturation.
 inline Word32 mac_flag(Word32 acc, Word16 a, Word16 b, bool &sat) {
     int64_t prod;
@@ -336,6 +323,45 @@ void convolve_c(const Word16 *x, const Word16 *h, Word16 *y) {
     }
 }
 
+void norm_corr_sums_c(const Word16 *excf, const Word16 *xn, const Word16 *h, const Word16 *x_new,
+                      Word32 n_lags, Word32 scaling, Word32 *energy, Word32 *dot) {
+    Word16 buf_a[L_SUBFR], buf_b[L_SUBFR];
+    Word16 *cur = buf_a, *next = buf_b;
+    for (int j = 0; j < L_SUBFR; ++j) cur[j] = excf[j];
+
+    // extract_h(l_shl(l_mult(e, h), h_fac)) with s = h_fac + 1 = 4 - scaling
+    // doublings in all: e·h (exact, |e·h| <= 2^30) saturates after them
+    // exactly when it leaves [MIN_32 >> s, MAX_32 >> s], and the high half
+    // of the clamped value is then (e·h) >> (16 - s).
+    const int s = 4 - scaling;
+    const Word32 lo = MIN_32 >> s, hi = MAX_32 >> s;
+
+    const int64_t xn_sq = sum_squares(xn);
+    for (Word32 i = 0;; ++i) {
+        const int64_t cur_sq = sum_squares(cur);
+        energy[i] = energy_from(cur_sq);
+        if (enc_kernel::no_saturation(xn_sq, cur_sq)) {
+            Word32 d = 0;
+            for (int j = 0; j < L_SUBFR; ++j) d += 2 * (int32_t{xn[j]} * cur[j]);
+            dot[i] = d;
+        } else {
+            dot[i] = enc_kernel::dot_sat(xn, cur, L_SUBFR);
+        }
+        if (i + 1 >= n_lags) break;
+
+        // Filtered excitation of the next lag: shift by one sample and add
+        // the contribution of the newly included excitation sample.
+        const Word32 e = x_new[-i];
+        for (int j = 1; j < L_SUBFR; ++j) {
+            Word32 p = e * h[j];
+            p = p < lo ? lo : p > hi ? hi : p;
+            next[j] = sat16_32((p >> (16 - s)) + cur[j - 1]);
+        }
+        next[0] = shr(x_new[-i], scaling);
+        std::swap(cur, next);
+    }
+}
+
 }  // namespace vamrnb
 
 using namespace vamrnb;
@@ -346,49 +372,28 @@ void vamrnbe_convolve(const int16_t *x, const int16_t *h, int16_t *y) { dsp().co
 
 void vamrnbe_norm_corr_filt(const int16_t *exc, const int16_t *xn, const int16_t *h,
                             int32_t t_min, int32_t t_max, int16_t *corr) {
-    Word16 buf_a[L_SUBFR], buf_b[L_SUBFR];
-    Word16 *excf = buf_a, *next = buf_b;
+    Word16 excf[L_SUBFR];
     vamrnbe_convolve(exc - t_min, h, excf);
 
     // Work on excf/4 when its energy is large, to keep the sums in range.
-    Word16 h_fac = 15 - 12;
     Word16 scaling = 0;
     if (energy_from(sum_squares(excf)) > 67108864L) {
         for (int j = 0; j < L_SUBFR; ++j) excf[j] = shr(excf[j], 2);
-        h_fac = 15 - 12 - 2;
         scaling = 2;
     }
 
-    // extract_h(l_shl(l_mult(e, h), h_fac)) with s = h_fac + 1 doublings in
-    // all: e·h (exact, |e·h| <= 2^30) saturates after them exactly when it
-    // leaves [MIN_32 >> s, MAX_32 >> s], and the high half of the clamped
-    // value is then (e·h) >> (16 - s).
-    const int s = h_fac + 1;
-    const Word32 lo = MIN_32 >> s, hi = MAX_32 >> s;
-
-    const int64_t xn_sq = sum_squares(xn);
-    int k = -t_min;
-    for (int32_t lag = t_min; lag <= t_max; ++lag) {
+    // Any range within the excitation history (lags up to PIT_MAX plus the
+    // interpolator's margin) fits; the searches use at most CORR_MAX lags.
+    constexpr int kMaxLags = PIT_MAX + 2 * INTER_TAPS + 1;
+    Word32 energy[kMaxLags], dot[kMaxLags];
+    const Word32 n_lags = t_max - t_min + 1;
+    if (n_lags <= 0 || n_lags > kMaxLags) return;
+    dsp().norm_corr_sums(excf, xn, h, exc - t_min - 1, n_lags, scaling, energy, dot);
+    for (Word32 i = 0; i < n_lags; ++i) {
         Word16 norm_h, norm_l_, corr_h, corr_l;
-        const int64_t excf_sq = sum_squares(excf);
-        l_extract(vamrnb_inv_sqrt(energy_from(excf_sq)), &norm_h, &norm_l_);
-        l_extract(dot_from(xn, excf, xn_sq, excf_sq), &corr_h, &corr_l);
-
-        corr[lag - t_min] = extract_h(l_shl(mpy_32(corr_h, corr_l, norm_h, norm_l_), 16));
-
-        if (lag != t_max) {
-            // Filtered excitation of the next lag: shift by one sample and add
-            // the contribution of the newly included excitation sample.
-            --k;
-            const Word32 e = exc[k];
-            for (int j = 1; j < L_SUBFR; ++j) {
-                Word32 p = e * h[j];
-                p = p < lo ? lo : p > hi ? hi : p;
-                next[j] = sat16_32((p >> (16 - s)) + excf[j - 1]);
-            }
-            next[0] = shr(exc[k], scaling);
-            std::swap(excf, next);
-        }
+        l_extract(vamrnb_inv_sqrt(energy[i]), &norm_h, &norm_l_);
+        l_extract(dot[i], &corr_h, &corr_l);
+        corr[i] = extract_h(l_shl(mpy_32(corr_h, corr_l, norm_h, norm_l_), 16));
     }
 }
 

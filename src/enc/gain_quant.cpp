@@ -10,6 +10,7 @@
 // the pitch-gain history are updated, and after the last subframe the
 // parameters are turned into bits.
 
+#include "enc/gain_vq.h"
 #include "enc/subframe.h"
 
 #include "basic_op/ext_op.h"
@@ -18,6 +19,8 @@
 
 namespace vamrnb {
 namespace {
+
+using namespace gain_vq;
 
 constexpr Word16 SHARP_MAX = 13017;   // sharpening ceiling, Q14
 constexpr int NB_QUA_CODE = 32;
@@ -210,7 +213,27 @@ Word16 qua_gain(int32_t mode, Word16 exp_gcode0, Word16 frac_gcode0, const Word1
 
     Word32 dist_min = MAX_32;
     Word16 index = 0;
-    for (int i = 0; i < n_rows; ++i) {
+    static const gain_bounds bounds[2] = {table_bounds(vamrnb_tbl_gain_highrates, 128, 0, 1),
+                                          table_bounds(vamrnb_tbl_gain_lowrates, 64, 0, 1)};
+    int64_t g_max[5];
+    gain_product_bounds(bounds[n_rows == 128 ? 0 : 1], gcode0, g_max);
+    const bool plain = terms_fit(coeff, g_max, 5);
+    if (plain) {
+        // As in the MR475 search: all scores, then the first smallest.
+        int32_t score[128];
+        for (int i = 0; i < n_rows; ++i) {
+            const int16_t *row = tbl + 4 * i;
+            const int32_t L = row_score(coeff, coeff_lo, row[0], (row[1] * gcode0) >> 15);
+            score[i] = row[0] > gp_limit ? MAX_32 : L;
+        }
+        for (int i = 0; i < n_rows; ++i) {
+            if (score[i] < dist_min) {
+                dist_min = score[i];
+                index = static_cast<Word16>(i);
+            }
+        }
+    }
+    for (int i = 0; !plain && i < n_rows; ++i) {
         const int16_t *row = tbl + 4 * i;
         const Word16 g_pitch = row[0];
         if (g_pitch > gp_limit) continue;
@@ -308,7 +331,31 @@ Word16 mr475_gain_quant(subfr_state &ss, const Word16 *sf1_code, Word16 sf1_exp_
     Word32 dist_min = MAX_32;
     Word16 index = 0;
     const int16_t *tbl = vamrnb_tb1_gain_mr475;
-    for (int i = 0; i < VQ_ROWS_MR475; ++i) {
+    static const gain_bounds b0 = table_bounds(tbl, VQ_ROWS_MR475, 0, 1);
+    static const gain_bounds b1 = table_bounds(tbl, VQ_ROWS_MR475, 2, 3);
+    int64_t g_max[10];
+    gain_product_bounds(b0, sf0_gcode0, g_max);
+    gain_product_bounds(b1, sf1_gcode0, g_max + 5);
+    const bool plain = terms_fit(coeff, g_max, 10);
+    if (plain) {
+        // Every row's score first (a loop the compiler vectorises); rows
+        // over the limit score MAX_32, which never wins.
+        int32_t score[VQ_ROWS_MR475];
+        for (int i = 0; i < VQ_ROWS_MR475; ++i) {
+            const int16_t *row = tbl + 4 * i;
+            const int32_t L =
+                row_score(coeff, coeff_lo, row[0], (row[1] * sf0_gcode0) >> 15) +
+                row_score(coeff + 5, coeff_lo + 5, row[2], (row[3] * sf1_gcode0) >> 15);
+            score[i] = (row[0] > gp_limit || row[2] > gp_limit) ? MAX_32 : L;
+        }
+        for (int i = 0; i < VQ_ROWS_MR475; ++i) {
+            if (score[i] < dist_min) {
+                dist_min = score[i];
+                index = static_cast<Word16>(i);
+            }
+        }
+    }
+    for (int i = 0; !plain && i < VQ_ROWS_MR475; ++i) {
         const int16_t *row = tbl + 4 * i;
         // Rows whose pitch gain exceeds the limit in either subframe are out.
         if (row[0] > gp_limit || row[2] > gp_limit) continue;

@@ -20,17 +20,36 @@ inline Word32 wdist(Word32 acc, Word16 w, Word16 diff) {
     return l_mac(acc, t, t);
 }
 
+// Weighted square of one component, not yet doubled: t = mult(w, r - c)
+// with the difference saturated to 16 bits.  |t| <= 32768 (mult saturates
+// only the product of two -32768s, to 32767), so t*t <= 2^30 and three of
+// them fit in 32 unsigned bits.
+inline uint32_t wsq(int32_t w, int32_t r, int32_t c) {
+    int32_t d = r - c;
+    d = d > MAX_16 ? MAX_16 : d < MIN_16 ? MIN_16 : d;
+    int32_t t = (w * d) >> 15;
+    t = t > MAX_16 ? MAX_16 : t;
+    return static_cast<uint32_t>(t * t);
+}
+
 // Three-component search over `rows` rows of `dico` taken `stride` rows
 // apart.  Returns the position among the rows tried and writes the chosen
 // row over r.
+//
+// The distance is defined as the saturating sum of the doubled squares,
+// compared strictly against a best that starts at MAX_32.  The terms are
+// non-negative, so that sum is min(2s, MAX_32) for the exact sum s of the
+// squares: a row whose 2s reaches MAX_32 can never win, and between winners
+// the comparison is s < best.  Hence the search on s with the first best
+// below 2^30 (2s <= MAX_32 - 1).
 Word16 vq_subvec3(Word16 *r, const Word16 *dico, const Word16 *w, int rows, int stride) {
-    Word32 best = MAX_32;
+    uint32_t best = uint32_t{1} << 30;
     int index = 0;
+    const Word16 r0 = r[0], r1 = r[1], r2 = r[2];
+    const Word16 w0 = w[0], w1 = w[1], w2 = w[2];
     const Word16 *row = dico;
     for (int i = 0; i < rows; ++i, row += 3 * stride) {
-        Word32 d = wdist(0, w[0], sub(r[0], row[0]));
-        d = wdist(d, w[1], sub(r[1], row[1]));
-        d = wdist(d, w[2], sub(r[2], row[2]));
+        const uint32_t d = wsq(w0, r0, row[0]) + wsq(w1, r1, row[1]) + wsq(w2, r2, row[2]);
         if (d < best) {
             best = d;
             index = i;

@@ -31,6 +31,7 @@ DspKernels build(uint32_t flags) {
     c.vq_subvec_s = vq_subvec_s_c;
     c.vq_subvec4 = vq_subvec4_c;
     c.cor_h_x = cor_h_x_c;
+    c.norm_corr_sums = norm_corr_sums_c;
 #if defined(VAMRNB_DSP_X86)
     dsp_init_x86(c, flags);
 #endif

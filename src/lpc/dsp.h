@@ -33,6 +33,14 @@ using VqSubvecFn = int16_t (*)(Word16 *r1, Word16 *r2, const Word16 *dico, const
                                const Word16 *w2, Word32 size);
 using CorHxFn = void (*)(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
 using VqSubvec4Fn = int16_t (*)(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
+// Lag loop of the normalised correlation: the energy of each of n_lags
+// filtered excitations and its correlation with xn (both as saturating
+// sums from 0), the first being excf, each next one formed from the last by
+// the sample x_new[-i] entering through h (the sums already scaled down by
+// `scaling` bits, 0 or 2).
+using NormCorrSumsFn = void (*)(const Word16 *excf, const Word16 *xn, const Word16 *h,
+                                const Word16 *x_new, Word32 n_lags, Word32 scaling,
+                                Word32 *energy, Word32 *dot);
 
 // One entry per kernel; the exported function of the same name (vamrnb_*,
 // vamrnbe_*) calls through the table in use.
@@ -49,6 +57,7 @@ struct DspKernels {
     VqSubvecFn vq_subvec_s;
     VqSubvec4Fn vq_subvec4;
     CorHxFn cor_h_x;
+    NormCorrSumsFn norm_corr_sums;
 };
 
 // The kernel set in use (selected on first call).
@@ -78,7 +87,10 @@ uint32_t cpu_detect();
     int16_t vq_subvec_s_##sfx(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,        \
                               const Word16 *w2, Word32 size);                                      \
     int16_t vq_subvec4_##sfx(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);         \
-    void cor_h_x_##sfx(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
+    void cor_h_x_##sfx(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);                \
+    void norm_corr_sums_##sfx(const Word16 *excf, const Word16 *xn, const Word16 *h,              \
+                              const Word16 *x_new, Word32 n_lags, Word32 scaling, Word32 *energy, \
+                              Word32 *dot);
 
 // The portable versions, each defined beside the stage that owns it.
 VAMRNB_DECL_KERNELS(c)

@@ -148,6 +148,32 @@ void check_correlations(Checker &c) {
             });
         },
         typical, [&](CorHxFn fn) { fn(h, x, y, 2); });
+
+    // Normalised-correlation lag loop: every lag count up to the widest
+    // range, both scalings; rail-filled excitations and responses drive the
+    // products past the clamp, the next excitation past 16 bits and the
+    // correlation past the bound that allows summing in any order.
+    int16_t excf[40] = {}, hist[80] = {};
+    const auto ncf_inputs = [&](int t) {
+        g.fill(excf, 40, t);
+        g.fill(x, 40, t / 3 + 1);
+        g.fill(h, 40, t / 5);
+        g.fill(hist, 80, t / 7);
+        if (t % 4 == 1) h[0] = 4096;
+    };
+    c.kernel<NormCorrSumsFn>(
+        "norm_corr_sums", &DspKernels::norm_corr_sums, 4000,
+        [&](NormCorrSumsFn fn, int t) {
+            ncf_inputs(t);
+            const int32_t n_lags = 1 + t % 40, scaling = t / 40 % 2 * 2;
+            return same_output<int32_t>(g, 80, nullptr, 0, [&](int32_t *out, bool ref) {
+                return (ref ? norm_corr_sums_c : fn)(excf, x, h, hist + 79, n_lags, scaling, out,
+                                                     out + 40),
+                       0;
+            });
+        },
+        [&] { g.fill(excf, 40, 2); g.fill(x, 40, 2); g.fill(h, 40, 2); g.fill(hist, 80, 2); },
+        [&](NormCorrSumsFn fn) { fn(excf, x, h, hist + 79, 20, 0, corr, corr + 40); });
 }
 
 // Split-VQ searches: a real codebook, small-valued ones full of ties (equal
@@ -217,7 +243,7 @@ void check_dispatch(Checker &c) {
         const DspKernels &k = dsp();
         const bool full = k.syn_filt && k.syn_filt_m && k.residu && k.pred_lt_3or6 && k.energy &&
                           k.inner_product && k.comp_corr && k.convolve && k.vq_subvec && k.vq_subvec_s &&
-                          k.vq_subvec4 && k.cor_h_x;
+                          k.vq_subvec4 && k.cor_h_x && k.norm_corr_sums;
         if (&k != &dsp_for(mask) || !full) ok = c.fail("mask " + std::to_string(mask));
     }
     vamrnb_set_cpu_flags(before);

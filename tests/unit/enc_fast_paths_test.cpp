@@ -10,7 +10,9 @@
 #include <vector>
 
 #include "basic_op/ext_op.h"
+#include "enc/gain_vq.h"
 #include "enc/subframe.h"
+#include "lpc/tables.h"
 
 using namespace vamrnb;
 
@@ -119,5 +121,120 @@ TEST(EncoderFastPaths, SignedCorrelationMatrixAroundTheRoundingLimit) {
                 ASSERT_EQ(rr[i * L_CODE + j], want);
             }
         }
+    }
+}
+
+// ---- joint gain searches -----------------------------------------------------
+
+namespace {
+
+// One subframe's share of a row's score as the searches define it: five
+// mpy_32_16 terms accumulated with saturation onto L.
+Word32 saturating_score(Word32 L, const Word16 *hi, const Word16 *lo, Word16 gp, Word16 gc) {
+    const Word16 g[5] = {mult(gp, gp), gp, mult(gc, gc), gc, mult(gc, gp)};
+    for (int k = 0; k < 5; ++k) {
+        L = l_mac(L, hi[k], g[k]);
+        L = l_mac(L, mult(lo[k], g[k]), 1);
+    }
+    return L;
+}
+
+// Compares the plain score of every MR475 row with the saturating one;
+// returns false on the first difference.
+bool rows_agree(const Word16 *hi, const Word16 *lo, Word16 gc0, Word16 gc1) {
+    const int16_t *tbl = vamrnb_tb1_gain_mr475;
+    for (int i = 0; i < 256; ++i) {
+        const int16_t *r = tbl + 4 * i;
+        const Word16 g0 = mult(r[1], gc0), g1 = mult(r[3], gc1);
+        const Word32 want = saturating_score(saturating_score(0, hi, lo, r[0], g0), hi + 5, lo + 5,
+                                             r[2], g1);
+        const int32_t got = gain_vq::row_score(hi, lo, r[0], (r[1] * gc0) >> 15) +
+                            gain_vq::row_score(hi + 5, lo + 5, r[2], (r[3] * gc1) >> 15);
+        if (want != got) return false;
+    }
+    return true;
+}
+
+}  // namespace
+
+// Random coefficients of every magnitude, signs mixed as in real error terms
+// (and not): whenever the bound admits the plain score it equals the
+// saturating one for every row, and large coefficients do fail the bound.
+TEST(GainSearchFastPath, PlainScoreMatchesWheneverTheBoundAdmitsIt) {
+    std::mt19937 rng(9);
+    const auto b0 = gain_vq::table_bounds(vamrnb_tb1_gain_mr475, 256, 0, 1);
+    const auto b1 = gain_vq::table_bounds(vamrnb_tb1_gain_mr475, 256, 2, 3);
+    int admitted = 0, refused = 0;
+    for (int trial = 0; trial < 3000; ++trial) {
+        Word16 hi[10], lo[10];
+        const int amp = 1 << (trial % 16);
+        for (int k = 0; k < 10; ++k) {
+            hi[k] = noise(rng, 1, amp)[0];
+            lo[k] = static_cast<Word16>(rng() % 32768);
+        }
+        const Word16 gc0 = static_cast<Word16>(16384 + rng() % 16384);
+        const Word16 gc1 = static_cast<Word16>(16384 + rng() % 16384);
+        int64_t g[10];
+        gain_vq::gain_product_bounds(b0, gc0, g);
+        gain_vq::gain_product_bounds(b1, gc1, g + 5);
+        if (!gain_vq::terms_fit(hi, g, 10)) {
+            ++refused;
+            continue;
+        }
+        ++admitted;
+        ASSERT_TRUE(rows_agree(hi, lo, gc0, gc1)) << "trial " << trial;
+    }
+    EXPECT_GT(admitted, 1000);
+    EXPECT_GT(refused, 100);
+}
+
+// Equal coefficients of one sign, raised to the largest value the bound
+// admits: the plain score still matches there; one step further the bound
+// refuses, and at full scale the saturating score really departs from the
+// exact one.
+TEST(GainSearchFastPath, BoundIsTightEnoughAndNeeded) {
+    const auto b0 = gain_vq::table_bounds(vamrnb_tb1_gain_mr475, 256, 0, 1);
+    const auto b1 = gain_vq::table_bounds(vamrnb_tb1_gain_mr475, 256, 2, 3);
+    const Word16 gc = MAX_16;
+    int64_t g[10];
+    gain_vq::gain_product_bounds(b0, gc, g);
+    gain_vq::gain_product_bounds(b1, gc, g + 5);
+    for (int sign : {1, -1}) {
+        Word16 hi[10], lo[10];
+        const auto set = [&](int v) {
+            for (int k = 0; k < 10; ++k) {
+                hi[k] = static_cast<Word16>(sign * v);
+                lo[k] = 32767;
+            }
+        };
+        int v = 0;
+        while (v < 32767) {
+            set(v + 1);
+            if (!gain_vq::terms_fit(hi, g, 10)) break;
+            ++v;
+        }
+        ASSERT_LT(v, 32767);
+        set(v);
+        EXPECT_TRUE(gain_vq::terms_fit(hi, g, 10));
+        EXPECT_TRUE(rows_agree(hi, lo, gc, gc)) << "at the bound, sign " << sign;
+        set(v + 1);
+        EXPECT_FALSE(gain_vq::terms_fit(hi, g, 10));
+        set(32767);
+        bool clamped = false;
+        for (int i = 0; i < 256; ++i) {
+            const int16_t *r = vamrnb_tb1_gain_mr475 + 4 * i;
+            const Word16 gp[2] = {r[0], r[2]}, gcode[2] = {mult(r[1], gc), mult(r[3], gc)};
+            int64_t exact = 0;
+            for (int half = 0; half < 2; ++half) {
+                const int64_t p = gp[half], c = gcode[half];
+                const int64_t terms[5] = {(p * p) >> 15, p, (c * c) >> 15, c, (c * p) >> 15};
+                for (int k = 0; k < 5; ++k)
+                    exact += 2 * (hi[5 * half + k] * terms[k] + ((lo[5 * half + k] * terms[k]) >> 15));
+            }
+            const Word32 full = saturating_score(saturating_score(0, hi, lo, gp[0], gcode[0]),
+                                                 hi + 5, lo + 5, gp[1], gcode[1]);
+            clamped = clamped || full != exact;
+        }
+        EXPECT_TRUE(clamped) << "sign " << sign;
     }
 }

@@ -26,6 +26,7 @@ inline void dsp_init_arm(DspKernels &c, uint32_t flags) {
     c.vq_subvec_s = vq_subvec_s_neon;
     c.vq_subvec4 = vq_subvec4_neon;
     c.cor_h_x = cor_h_x_neon;
+    c.norm_corr_sums = norm_corr_sums_neon;
 }
 
 }  // namespace vamrnb

@@ -127,6 +127,59 @@ Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 ini
     return enc_kernel::inner_product_finish(x, y, n, n8, init, ax, ay, sums, inner_product_c);
 }
 
+// Normalised-correlation lag loop with the 40-sample filtered excitation in
+// five registers (see the SSE4.1 version): squares are summed pairwise into
+// 64-bit lanes, the correlation in 32-bit lanes when the energies rule out
+// saturation, and the next excitation is formed before any block is stored;
+// the saturating narrow is sat16_32 of the portable version.
+void norm_corr_sums_neon(const Word16 *excf, const Word16 *xn, const Word16 *h, const Word16 *x_new,
+                         Word32 n_lags, Word32 scaling, Word32 *energy, Word32 *dot) {
+    Word16 buf[8 + L_SUBFR] = {};
+    Word16 *cur = buf + 8;
+    for (int j = 0; j < L_SUBFR; ++j) cur[j] = excf[j];
+
+    int16x8_t xv[5], hv[5];
+    for (int k = 0; k < 5; ++k) {
+        xv[k] = vld1q_s16(xn + 8 * k);
+        hv[k] = vld1q_s16(h + 8 * k);
+    }
+    const int s = 4 - scaling;   // see norm_corr_sums_c
+    const int32x4_t lo = vdupq_n_s32(MIN_32 >> s), hi = vdupq_n_s32(MAX_32 >> s);
+    const int32x4_t sh = vdupq_n_s32(-(16 - s));
+    const int64_t xn_sq = enc_kernel::sum_sq(xn, L_SUBFR);
+
+    for (Word32 i = 0;; ++i) {
+        uint64x2_t sq = vdupq_n_u64(0);
+        int32x4_t acc = vdupq_n_s32(0);
+        for (int k = 0; k < 5; ++k) {
+            const int16x8_t v = vld1q_s16(cur + 8 * k);
+            sq = vpadalq_u32(sq, vreinterpretq_u32_s32(vmull_s16(vget_low_s16(v), vget_low_s16(v))));
+            sq = vpadalq_u32(sq, vreinterpretq_u32_s32(vmull_s16(vget_high_s16(v), vget_high_s16(v))));
+            acc = mla8(acc, xv[k], v);
+        }
+        const int64_t cur_sq = static_cast<int64_t>(vgetq_lane_u64(sq, 0) + vgetq_lane_u64(sq, 1));
+        energy[i] = cur_sq > (MAX_32 >> 1) ? MAX_32 : static_cast<Word32>(2 * cur_sq);
+        dot[i] = enc_kernel::no_saturation(xn_sq, cur_sq) ? 2 * hsum(acc)
+                                                           : enc_kernel::dot_sat(xn, cur, L_SUBFR);
+        if (i + 1 >= n_lags) break;
+
+        const int16_t e = x_new[-i];
+        int16x8_t out[5];
+        for (int k = 0; k < 5; ++k) {
+            const int16x8_t prev = vld1q_s16(cur + 8 * k - 1);
+            int32x4_t p0 = vmull_n_s16(vget_low_s16(hv[k]), e);
+            int32x4_t p1 = vmull_n_s16(vget_high_s16(hv[k]), e);
+            p0 = vshlq_s32(vminq_s32(vmaxq_s32(p0, lo), hi), sh);
+            p1 = vshlq_s32(vminq_s32(vmaxq_s32(p1, lo), hi), sh);
+            p0 = vaddw_s16(p0, vget_low_s16(prev));
+            p1 = vaddw_s16(p1, vget_high_s16(prev));
+            out[k] = vcombine_s16(vqmovn_s32(p0), vqmovn_s32(p1));
+        }
+        for (int k = 0; k < 5; ++k) vst1q_s16(cur + 8 * k, out[k]);
+        cur[0] = shr(x_new[-i], scaling);
+    }
+}
+
 void comp_corr_neon(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr) {
     enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact);
 }

@@ -27,6 +27,7 @@ inline void dsp_init_x86(DspKernels &c, uint32_t flags) {
     c.vq_subvec_s = vq_subvec_s_sse41;
     c.vq_subvec4 = vq_subvec4_sse41;
     c.cor_h_x = cor_h_x_sse41;
+    c.norm_corr_sums = norm_corr_sums_sse41;
 
     if (!(flags & kCpuAvx2)) return;
     c.residu = residu_avx2;

@@ -169,6 +169,62 @@ VAMRNB_SSE41 Word32 inner_product_sse41(const Word16 *x, const Word16 *y, Word32
     return enc_kernel::inner_product_finish(x, y, n, n8, init, ax, ay, sums, inner_product_c);
 }
 
+// Normalised-correlation lag loop with the 40-sample filtered excitation in
+// five registers.  Squares are summed in 64-bit lanes (a pair of squares
+// fits in 32 unsigned bits); the correlation in 32-bit lanes when the
+// energies rule out saturation (kernel_common.h), else sequentially.  The
+// next excitation is formed in place: all five blocks are computed from
+// the current one before any is stored.
+VAMRNB_SSE41 void norm_corr_sums_sse41(const Word16 *excf, const Word16 *xn, const Word16 *h,
+                                       const Word16 *x_new, Word32 n_lags, Word32 scaling,
+                                       Word32 *energy, Word32 *dot) {
+    alignas(16) Word16 buf[8 + L_SUBFR] = {};
+    Word16 *cur = buf + 8;
+    for (int j = 0; j < L_SUBFR; ++j) cur[j] = excf[j];
+    const auto at = [](const Word16 *p) { return _mm_loadu_si128(reinterpret_cast<const __m128i *>(p)); };
+
+    __m128i xv[5], hl[5], hh[5];
+    for (int k = 0; k < 5; ++k) {
+        xv[k] = at(xn + 8 * k);
+        hl[k] = _mm_cvtepi16_epi32(at(h + 8 * k));
+        hh[k] = _mm_cvtepi16_epi32(_mm_srli_si128(at(h + 8 * k), 8));
+    }
+    const int s = 4 - scaling;   // see norm_corr_sums_c
+    const __m128i lo = _mm_set1_epi32(MIN_32 >> s), hi = _mm_set1_epi32(MAX_32 >> s);
+    const __m128i sh = _mm_cvtsi32_si128(16 - s), zero = _mm_setzero_si128();
+    const int64_t xn_sq = enc_kernel::sum_sq(xn, L_SUBFR);
+
+    for (Word32 i = 0;; ++i) {
+        __m128i sq = zero, acc = zero;
+        for (int k = 0; k < 5; ++k) {
+            const __m128i v = _mm_load_si128(reinterpret_cast<const __m128i *>(cur + 8 * k));
+            const __m128i m = _mm_madd_epi16(v, v);
+            sq = _mm_add_epi64(sq, _mm_unpacklo_epi32(m, zero));
+            sq = _mm_add_epi64(sq, _mm_unpackhi_epi32(m, zero));
+            acc = _mm_add_epi32(acc, _mm_madd_epi16(xv[k], v));
+        }
+        const int64_t cur_sq = _mm_cvtsi128_si64(sq) + _mm_extract_epi64(sq, 1);
+        energy[i] = cur_sq > (MAX_32 >> 1) ? MAX_32 : static_cast<Word32>(2 * cur_sq);
+        dot[i] = enc_kernel::no_saturation(xn_sq, cur_sq) ? 2 * hsum(acc)
+                                                           : enc_kernel::dot_sat(xn, cur, L_SUBFR);
+        if (i + 1 >= n_lags) break;
+
+        const __m128i e = _mm_set1_epi32(x_new[-i]);
+        __m128i out[5];
+        for (int k = 0; k < 5; ++k) {
+            const __m128i prev = at(cur + 8 * k - 1);
+            __m128i p0 = _mm_mullo_epi32(e, hl[k]), p1 = _mm_mullo_epi32(e, hh[k]);
+            p0 = _mm_sra_epi32(_mm_min_epi32(_mm_max_epi32(p0, lo), hi), sh);
+            p1 = _mm_sra_epi32(_mm_min_epi32(_mm_max_epi32(p1, lo), hi), sh);
+            p0 = _mm_add_epi32(p0, _mm_cvtepi16_epi32(prev));
+            p1 = _mm_add_epi32(p1, _mm_cvtepi16_epi32(_mm_srli_si128(prev, 8)));
+            out[k] = _mm_packs_epi32(p0, p1);
+        }
+        for (int k = 0; k < 5; ++k) _mm_store_si128(reinterpret_cast<__m128i *>(cur + 8 * k), out[k]);
+        cur[0] = shr(x_new[-i], scaling);
+    }
+}
+
 VAMRNB_SSE41 void comp_corr_sse41(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min,
                                   Word32 *corr) {
     enc_kernel::comp_corr(x, len, lag_max, lag_min, corr, dot_exact_sse41);
