@@ -1,5 +1,5 @@
-// Comfort-noise decoding: the noise generator, the reception state machine,
-// the reflection-coefficient check and the comfort-noise level.
+// Comfort-noise decoding: the reception state machine, the
+// reflection-coefficient check and the comfort-noise level.
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -13,8 +13,6 @@ using namespace vamrnb;
 
 namespace {
 
-constexpr int32_t kSeed = 0x70816958;
-
 dtx_dec_state fresh() {
     dtx_dec_state st;
     dtx_dec_reset(&st);
@@ -22,26 +20,6 @@ dtx_dec_state fresh() {
 }
 
 }  // namespace
-
-TEST(CnNoise, GeneratorTapsAndBitOrder) {
-    int32_t s = kSeed;
-    EXPECT_EQ(vamrnbd_pseudonoise(0, &s), 0);
-    EXPECT_EQ(s, kSeed);
-
-    // Bit 0 of the seed is 0 and bit 28 is 1: output 0, feedback 1 into bit 30.
-    EXPECT_EQ(vamrnbd_pseudonoise(1, &s), 0);
-    EXPECT_EQ(s, 0x7840B4AC);
-
-    // An n-bit draw is n one-bit draws, the first one most significant.
-    for (int n = 2; n <= 15; ++n) {
-        int32_t a = 0x12345677 + n;
-        int32_t b = a;
-        int expect = 0;
-        for (int i = 0; i < n; ++i) expect = (expect << 1) | vamrnbd_pseudonoise(1, &b);
-        EXPECT_EQ(vamrnbd_pseudonoise(n, &a), expect) << n;
-        EXPECT_EQ(a, b) << n;
-    }
-}
 
 TEST(CnStateMachine, StartsInNoiseAndLeavesOnGoodSpeech) {
     dtx_dec_state st = fresh();
