@@ -1,7 +1,10 @@
-// Bit-stream reader and writer at their ends: exhaustion, the partial cache
-// and the byte accounting of a full frame, and the writer's buffer-end rules.
+// Bit-stream reader and writer: exhaustion and the partial cache, peeking and
+// skipping, the little-endian reader (exported, though no codec stage uses
+// them) and the writer's buffer-end rules.  Plain reads and writes run in
+// every frame of the encoder and decoder streams.
 #include <gtest/gtest.h>
 
+#include <random>
 #include <vector>
 
 #include "common/bitstream.h"
@@ -9,12 +12,18 @@
 using namespace vamrnb;
 
 namespace {
-// The n bits at bit position pos of a byte string, most significant first.
+// The n bits at bit position pos of a byte string, MSB-first or LSB-first.
 uint32_t msb_bits(const std::vector<uint8_t> &b, int pos, int n) {
     uint32_t v = 0;
     for (int k = pos; k < pos + n; ++k) v = (v << 1) | ((b[k / 8] >> (7 - k % 8)) & 1u);
     return v;
 }
+uint32_t lsb_bits(const std::vector<uint8_t> &b, int pos, int n) {
+    uint32_t v = 0;
+    for (int k = pos + n - 1; k >= pos; --k) v = (v << 1) | ((b[k / 8] >> (k % 8)) & 1u);
+    return v;
+}
+uint32_t consumed_bytes(int bit_pos) { return static_cast<uint32_t>((bit_pos + 7) / 8); }
 }  // namespace
 
 TEST(Bitstream, ReaderEndsAndPartialCache) {
@@ -42,6 +51,71 @@ TEST(Bitstream, ReaderEndsAndPartialCache) {
     EXPECT_EQ(vcmn_bsr_read(&r, 3), 0x5u);
     // More than the buffer still holds fails, cached bits or not.
     EXPECT_EQ(vcmn_bsr_read(&r, 8), 0xFFFFFFFFu);
+}
+
+TEST(Bitstream, PeekSkipAndAlign) {
+    std::vector<uint8_t> data(12);
+    for (int i = 0; i < 12; ++i) data[i] = uint8_t(0x5A ^ (i * 29));
+    std::mt19937 rng(3);
+    for (int trial = 0; trial < 200; ++trial) {
+        vcmn_bsr r;
+        vcmn_bsr_init(&r, data.data(), 12, nullptr);
+        for (int pos = 0; pos < 60;) {
+            const int n = 1 + int(rng() % 24), s = int(rng() % 9), op = int(rng() % 4);
+            uint8_t bit = 7;
+            if (op == 0) {  // peek, then read the same bits
+                ASSERT_EQ(vcmn_bsr_peek(&r, n), msb_bits(data, pos, n)) << pos << " " << n;
+                ASSERT_EQ(vcmn_bsr_read(&r, n), msb_bits(data, pos, n));
+            } else if (op == 1) {
+                ASSERT_EQ(vcmn_bsr_skip_peek(&r, s, n), msb_bits(data, pos + s, n)) << pos << " " << s;
+            } else if (op == 2) {
+                ASSERT_TRUE(vcmn_bsr_read1_value(&r, &bit) == 0 && bit == msb_bits(data, pos, 1));
+            } else {
+                vcmn_bsr_skip_to_align8(&r);
+            }
+            pos = op == 0 ? pos + n : op == 1 ? pos + s : op == 2 ? pos + 1 : (pos + 7) / 8 * 8;
+            ASSERT_EQ(bsr_bytes_consumed(&r), consumed_bytes(pos)) << pos;
+        }
+    }
+    // Peeking past the end fills with zeros; a failed read stores nothing.
+    const std::vector<uint8_t> two = {0xAB, 0xCD};
+    vcmn_bsr r;
+    vcmn_bsr_init(&r, two.data(), 2, nullptr);
+    EXPECT_EQ(vcmn_bsr_peek(&r, 20), 0xABCD0u);
+    vcmn_bsr_init(&r, two.data(), 0, nullptr);
+    uint8_t b = 9;
+    EXPECT_TRUE(vcmn_bsr_read1_value(&r, &b) == -1 && b == 9);
+    EXPECT_EQ(vcmn_bsr_skip_peek(&r, 3, 4), 0u);
+    EXPECT_EQ(vcmn_bsr_clz_in_code(0), 32);
+    EXPECT_EQ(vcmn_bsr_clz_in_code(0x00012345u), 15);
+}
+
+TEST(Bitstream, LittleEndianReader) {
+    const std::vector<uint8_t> two = {0x34, 0x12};
+    vcmn_bsr r;
+    vcmn_bsr_init(&r, two.data(), 2, vcmn_bsr_le_flush);
+    EXPECT_EQ(vcmn_bsr_le_read(&r, 12), 0x234u);
+    EXPECT_EQ(vcmn_bsr_le_read(&r, 4), 0x1u);
+    EXPECT_EQ(vcmn_bsr_le_read(&r, 1), 0xFFFFFFFFu);
+
+    std::vector<uint8_t> data(40);
+    std::mt19937 rng(5);
+    for (auto &x : data) x = uint8_t(rng());
+    vcmn_bsr_init(&r, data.data(), 40, vcmn_bsr_le_flush);
+    for (int pos = 0; pos < 280;) {
+        const int n = 1 + int(rng() % 32);
+        ASSERT_EQ(vcmn_bsr_le_read(&r, n), lsb_bits(data, pos, n)) << pos << " " << n;
+        pos += n;
+        if (rng() % 4 == 0) {
+            const int s = int(rng() % uint32_t(r.bits + 1));
+            vcmn_bsr_le_skip(&r, s);
+            pos += s;
+        } else if (rng() % 5 == 0) {
+            vcmn_bsr_le_skip_to_align8(&r);
+            pos = (pos + 7) / 8 * 8;
+        }
+        ASSERT_EQ(bsr_bytes_consumed(&r), consumed_bytes(pos));
+    }
 }
 
 TEST(Bitstream, WriterBufferEnd) {
