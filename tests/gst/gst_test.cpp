@@ -6,7 +6,6 @@
 // playing, the padded last frame, and an arbitrary source through decodebin.
 #include <gst/gst.h>
 #include <gtest/gtest.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <cmath>
@@ -22,9 +21,11 @@
 
 #include "vamrnb.h"
 #include "vamrnb_rtp.h"
+#include "../support/amr_file.h"
 
 namespace fs = std::filesystem;
-using Bytes = std::vector<uint8_t>;
+using amr_file::Bytes;
+using amr_file::read_bytes;
 
 namespace {
 
@@ -33,11 +34,6 @@ const fs::path kDemo = kSource / "tools/demo/allison-congrats.wav";
 const char kMagic[] = "#!AMR\n";
 constexpr size_t kMagicSize = 6;
 constexpr GstClockTime kFrameNs = 20 * GST_MSECOND;
-
-Bytes read_bytes(const fs::path &p) {
-    std::ifstream f(p, std::ios::binary);
-    return Bytes(std::istreambuf_iterator<char>(f), {});
-}
 
 // The samples of a 16-bit WAV file's data chunk.
 std::vector<int16_t> wav_samples(const fs::path &p) {
@@ -53,35 +49,6 @@ std::vector<int16_t> wav_samples(const fs::path &p) {
         pos += 8 + len + (len & 1);
     }
     return {};
-}
-
-// The library's storage file for pcm (a partial last frame padded with zeros);
-// mode_at gives the mode of each frame.
-Bytes lib_encode(std::vector<int16_t> pcm, std::function<int(size_t)> mode_at, bool dtx,
-                 int vad) {
-    codec_config cfg{};
-    cfg.enc.dtx = dtx;
-    cfg.enc.vad_option = vad == 2;
-    cfg.enc.mode = mode_at(0);
-    vamrnb_encoder *enc = vamrnbe_create(&cfg, nullptr);
-    pcm.resize((pcm.size() + 159) / 160 * 160);
-    Bytes out(kMagic, kMagic + kMagicSize);
-    frame_info info{};
-    for (size_t f = 0; f * 160 < pcm.size(); ++f) {
-        uint8_t frame[32];
-        pcm_buffer in{};
-        in.data[0] = &pcm[f * 160];
-        bitstream_buffer bs{frame, 0, sizeof frame};
-        vamrnbe_set_mode(enc, mode_at(f));
-        vamrnbe_encode(enc, &in, &bs, &info);
-        out.insert(out.end(), frame, frame + info.bytes);
-    }
-    vamrnbe_delete(enc);
-    return out;
-}
-
-Bytes lib_encode(const std::vector<int16_t> &pcm, int mode, bool dtx = false, int vad = 1) {
-    return lib_encode(pcm, [mode](size_t) { return mode; }, dtx, vad);
 }
 
 int frame_size(uint8_t toc) {
@@ -223,25 +190,6 @@ protected:
             GTEST_SKIP() << missing << " is not installed (gstreamer1.0-plugins-base/good)"; \
     } while (0)
 
-TEST_F(GstTest, InspectListsCapsAndProperties) {
-    const struct { const char *element; std::vector<const char *> shown; } cases[] = {
-        {"vamrnbdec", {"audio/AMR", "S16LE", "S24LE", "S8", "channels: [ 1, 2 ]"}},
-        {"vamrnbenc", {"audio/AMR", "S16LE", "band-mode", "MR475", "dtx", "vad", "file-header",
-                       "send-no-data"}}};
-    for (const auto &c : cases) {
-        FILE *p = ::popen((std::string("gst-inspect-1.0 ") + c.element + " 2>&1").c_str(), "r");
-        ASSERT_NE(p, nullptr);
-        std::string text;
-        char chunk[4096];
-        for (size_t n; (n = std::fread(chunk, 1, sizeof chunk, p)) > 0;) text.append(chunk, n);
-        const int status = ::pclose(p);
-        if (WIFEXITED(status) && WEXITSTATUS(status) == 127)  // the shell found no program
-            GTEST_SKIP() << "gst-inspect-1.0 is not installed (gstreamer1.0-tools)";
-        for (const char *s : c.shown)
-            EXPECT_NE(text.find(s), std::string::npos) << c.element << " does not show " << s;
-    }
-}
-
 TEST_F(GstTest, AmrparseDecodingEqualsLibraryInEveryOutputFormat) {
     NEEDS("amrparse", "filesrc", "filesink");
     // Every mode, DTX with both detectors, bad and lost frames, homing and a
@@ -326,7 +274,7 @@ TEST_F(GstTest, ThreeGppFileDecodesLikeTheAmrFile) {
         " ! 3gppmux ! filesink location=" + path("out.3gp"));
     run("filesrc location=" + path("out.3gp") + " ! qtdemux ! vamrnbdec ! filesink location=" +
         path("out.pcm"));
-    EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(lib_encode(wav_samples(kDemo), MR795, true)));
+    EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(amr_file::encode(wav_samples(kDemo), MR795, true)));
 }
 
 TEST_F(GstTest, RtpRoundTripWithAndWithoutLostPackets) {
@@ -336,7 +284,7 @@ TEST_F(GstTest, RtpRoundTripWithAndWithoutLostPackets) {
     // DTX: no-data frames are left out for the payloader and concealed back.
     run(head + "vamrnbenc band-mode=MR475 dtx=true send-no-data=false ! rtpamrpay ! "
         "rtpamrdepay name=depay ! vamrnbdec ! filesink location=" + path("out.pcm"));
-    EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(lib_encode(pcm, MR475, true)));
+    EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(amr_file::encode(pcm, MR475, true)));
 
     // Every 7th packet lost: the decoder conceals exactly those frames.
     std::set<size_t> lost;
@@ -352,7 +300,7 @@ TEST_F(GstTest, RtpRoundTripWithAndWithoutLostPackets) {
     run(head + "vamrnbenc band-mode=MR122 ! rtpamrpay ! rtpamrdepay name=depay ! vamrnbdec ! "
         "filesink location=" + path("out.pcm"), {{"depay.sink", drop}});
     ASSERT_GT(lost.size(), 100u);
-    EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(lib_encode(pcm, MR122), 0, 1, lost));
+    EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(amr_file::encode(pcm, MR122), 0, 1, lost));
 
     // Random losses as a network makes them: the stream runs to its end.
     run(head + "vamrnbenc ! rtpamrpay ! identity drop-probability=0.2 ! rtpamrdepay ! "
@@ -368,7 +316,7 @@ TEST_F(GstTest, LibraryOctetAlignedPacketsThroughRtpamrdepayDecodeLikeTheFrames)
     // frames a packet.  (Frame CRCs are left out: with crc=1 the stock
     // depayloader hands each frame on with its CRC byte still inside.)
     const Bytes file =
-        lib_encode(wav_samples(kDemo), [](size_t f) { return int(f / 25 % 8); }, true, 1);
+        amr_file::encode(wav_samples(kDemo), [](size_t f) { return int(f / 25 % 8); }, true, 1);
     std::set<int> types;
     for (size_t pos = kMagicSize; pos < file.size(); pos += size_t(frame_size(file[pos])))
         types.insert((file[pos] >> 3) & 15);
@@ -416,7 +364,7 @@ TEST_F(GstTest, EncoderEqualsLibraryInEveryModeWithAndWithoutDtx) {
                 "band-mode=" + std::to_string(mode) + " " + dtx + " ! filesink location=" +
                 path("out.amr"));
             EXPECT_EQ(read_bytes(path("out.amr")),
-                      lib_encode(pcm, mode, *dtx != 0, std::strstr(dtx, "vad=2") ? 2 : 1))
+                      amr_file::encode(pcm, mode, *dtx != 0, std::strstr(dtx, "vad=2") ? 2 : 1))
                 << "mode " << mode << " " << dtx;
         }
     }
@@ -435,7 +383,7 @@ TEST_F(GstTest, ModeChangeWhilePlayingAppliesFromTheNextFrame) {
     run("filesrc location=" + kDemo.string() + " ! wavparse ! vamrnbenc name=enc file-header=true"
         " dtx=true ! filesink location=" + path("out.amr"), {{"enc.src", switch_mode}});
     EXPECT_EQ(read_bytes(path("out.amr")),
-              lib_encode(wav_samples(kDemo),
+              amr_file::encode(wav_samples(kDemo),
                          [](size_t f) { return f < 100 ? MR122 : f < 401 ? MR475 : MR102; },
                          true, 1));
 }
@@ -456,7 +404,7 @@ TEST_F(GstTest, LastPartialFrameIsPaddedAndEveryFrameLasts20ms) {
     const Bytes in = read_bytes(raw);
     std::vector<int16_t> pcm(in.size() / 2);
     std::memcpy(pcm.data(), in.data(), pcm.size() * 2);
-    EXPECT_EQ(read_bytes(path("out.amr")), lib_encode(pcm, MR67));
+    EXPECT_EQ(read_bytes(path("out.amr")), amr_file::encode(pcm, MR67));
     ASSERT_EQ(pts.size(), 8u);
     for (size_t i = 0; i < pts.size(); ++i) {
         EXPECT_EQ(pts[i], i * kFrameNs) << i;

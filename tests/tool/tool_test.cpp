@@ -18,8 +18,10 @@
 #include <vector>
 
 #include "vamrnb.h"
+#include "../support/amr_file.h"
 
 namespace fs = std::filesystem;
+using amr_file::read_bytes;
 
 namespace {
 
@@ -116,11 +118,6 @@ Audio read_audio(const std::string &path) {
     return a;
 }
 
-std::vector<uint8_t> slurp(const std::string &path) {
-    std::ifstream f(path, std::ios::binary);
-    return std::vector<uint8_t>((std::istreambuf_iterator<char>(f)), std::istreambuf_iterator<char>());
-}
-
 void write_bytes(const std::string &path, const std::vector<uint8_t> &b) {
     std::ofstream f(path, std::ios::binary);
     f.write(reinterpret_cast<const char *>(b.data()), static_cast<std::streamsize>(b.size()));
@@ -130,26 +127,6 @@ std::vector<int16_t> to_s16(const std::vector<float> &x) {
     std::vector<int16_t> s;
     for (float v : x) s.push_back(static_cast<int16_t>(std::lrint(std::clamp(v, -1.0f, 0.99996f) * 32768)));
     return s;
-}
-
-// Encodes whole 160-sample frames (the last one zero-padded) with the library.
-std::vector<uint8_t> library_encode(std::vector<int16_t> pcm, int mode) {
-    codec_config cfg{};
-    cfg.enc.mode = mode;
-    vamrnb_encoder *enc = vamrnbe_create(&cfg, nullptr);
-    std::vector<uint8_t> out{'#', '!', 'A', 'M', 'R', '\n'};
-    pcm.resize((pcm.size() + 159) / 160 * 160);
-    frame_info info{};
-    for (size_t f = 0; f < pcm.size(); f += 160) {
-        pcm_buffer in{};
-        in.data[0] = pcm.data() + f;
-        uint8_t buf[32];
-        bitstream_buffer bs{buf, 0, 32};
-        vamrnbe_encode(enc, &in, &bs, &info);
-        out.insert(out.end(), buf, buf + info.bytes);
-    }
-    vamrnbe_delete(enc);
-    return out;
 }
 
 TEST_F(ToolTest, RoundTripsCommonFormats) {
@@ -167,7 +144,7 @@ TEST_F(ToolTest, RoundTripsCommonFormats) {
         write_audio(p(c.name), c.format, c.rate, c.channels, voice(c.rate, 2.0));
         Result r = run("encode -q -m 7.4 " + p(c.name) + " " + p("x.amr"));
         ASSERT_EQ(r.code, 0) << r.err;
-        const auto amr = slurp(p("x.amr"));
+        const auto amr = read_bytes(p("x.amr"));
         ASSERT_GE(amr.size(), 6u);
         EXPECT_EQ(std::string(amr.begin(), amr.begin() + 6), "#!AMR\n");
         EXPECT_EQ(amr.size(), 6u + 100u * 20u);  // 2 s = 100 frames of 20 bytes in MR74
@@ -194,13 +171,13 @@ TEST_F(ToolTest, RawEncodeEqualsLibraryAndRawDecodeWorks) {
     for (int mode = 0; mode < 8; ++mode) {
         Result r = run("encode -q -m " + std::to_string(mode) + " " + p("in.pcm") + " " + p("x.amr"));
         ASSERT_EQ(r.code, 0) << r.err;
-        EXPECT_EQ(slurp(p("x.amr")), library_encode(pcm, mode)) << "mode " << mode;
+        EXPECT_EQ(read_bytes(p("x.amr")), amr_file::encode(pcm, mode)) << "mode " << mode;
     }
     // The same samples in a WAV give the same stream as the raw file.
     write_bytes(p("same.raw"), raw);
     ASSERT_EQ(run("encode -q --raw " + p("same.raw") + " " + p("a.amr")).code, 0);
     ASSERT_EQ(run("decode -q --bits 24 --channels 2 " + p("a.amr") + " " + p("b.pcm")).code, 0);
-    EXPECT_EQ(slurp(p("b.pcm")).size(), 69u * 160 * 3 * 2);
+    EXPECT_EQ(read_bytes(p("b.pcm")).size(), 69u * 160 * 3 * 2);
 }
 
 TEST_F(ToolTest, OutputFormatsAndInfo) {
@@ -340,16 +317,16 @@ TEST_F(ToolTest, PipesFormatsAndRates) {
     const std::string tool = VAMRNB_TOOL_PATH;
     // Through pipes (nothing seekable anywhere).
     ASSERT_EQ(std::system(("cat " + p("in.wav") + " | " + tool + " encode -q - - | cat > " + p("piped.amr")).c_str()), 0);
-    EXPECT_EQ(slurp(p("piped.amr")), slurp(p("ref.amr")));
+    EXPECT_EQ(read_bytes(p("piped.amr")), read_bytes(p("ref.amr")));
     ASSERT_EQ(std::system(("cat " + p("ref.amr") + " | " + tool + " decode -q - -t wav - | cat > " + p("pipe.wav")).c_str()), 0);
     ASSERT_EQ(run("decode -q " + p("ref.amr") + " " + p("file.wav")).code, 0);
-    const auto piped = slurp(p("pipe.wav")), whole = slurp(p("file.wav"));
+    const auto piped = read_bytes(p("pipe.wav")), whole = read_bytes(p("file.wav"));
     ASSERT_EQ(piped.size(), whole.size());
     EXPECT_EQ(std::string(piped.begin(), piped.begin() + 4), "RIFF");
     EXPECT_TRUE(std::equal(piped.begin() + 44, piped.end(), whole.begin() + 44)) << "same samples after the header";
     // Standard output redirected to a file gets a complete WAV header.
     ASSERT_EQ(run("decode -q -t wav " + p("ref.amr") + " -").code, 0);
-    EXPECT_EQ(slurp(p("stdout.txt")), whole);
+    EXPECT_EQ(read_bytes(p("stdout.txt")), whole);
 
     const struct {
         const char *args, *name;
@@ -378,7 +355,7 @@ TEST_F(ToolTest, PipesFormatsAndRates) {
 TEST_F(ToolTest, DamagedFilesDecodeWithWarnings) {
     write_audio(p("in.wav"), SF_FORMAT_WAV | SF_FORMAT_PCM_16, 8000, 1, voice(8000, 1.0));
     ASSERT_EQ(run("encode -q -m 5.9 " + p("in.wav") + " " + p("ok.amr")).code, 0);
-    const auto amr = slurp(p("ok.amr"));  // magic + 50 frames of 16 bytes
+    const auto amr = read_bytes(p("ok.amr"));  // magic + 50 frames of 16 bytes
     ASSERT_EQ(amr.size(), 6u + 50 * 16);
     const std::vector<int> ref = decoded(p("ok.amr"), p("ok.wav"));
 
@@ -447,7 +424,7 @@ TEST_F(ToolTest, OutputDirectoryRulesAndBatchSummary) {
 TEST_F(ToolTest, InfoJsonAndForeignFiles) {
     write_audio(p("in.wav"), SF_FORMAT_WAV | SF_FORMAT_PCM_16, 8000, 1, voice(8000, 1.0));
     ASSERT_EQ(run("encode -q --dtx -m 12.2 " + p("in.wav") + " " + p("x.amr")).code, 0);
-    auto amr = slurp(p("x.amr"));
+    auto amr = read_bytes(p("x.amr"));
     amr.resize(amr.size() - 3);
     write_bytes(p("cut.amr"), amr);
     write_bytes(p("wb.amr"), {'#', '!', 'A', 'M', 'R', '-', 'W', 'B', '\n', 0x44});

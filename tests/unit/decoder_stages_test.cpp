@@ -1,5 +1,5 @@
-// Decoder stages in isolation: pitch-lag decoding and its concealment, the
-// gain concealment histories and the pulse codebooks.
+// Decoder stages in isolation: pitch-lag decoding and its concealment, and
+// the gain concealment histories.
 #include <gtest/gtest.h>
 
 #include <cstring>
@@ -102,37 +102,6 @@ TEST(DecoderGain, PitchHistoryIsClampedAndLimitedAfterBadFrame) {
     g = 7000;
     vamrnbd_ec_gain_pitch_update(d.st.get(), 0, 1, &g);
     EXPECT_EQ(g, 7000);
-}
-
-TEST(DecoderCodebook, PulseVectors) {
-    Decoder d;
-    d.w->T0 = 40;  // no pitch sharpening
-    auto nonzero = [&] {
-        std::vector<std::pair<int, int>> v;
-        for (int i = 0; i < 40; ++i)
-            if (d.w->code[i] != 0) v.emplace_back(i, d.w->code[i]);
-        return v;
-    };
-    using V = std::vector<std::pair<int, int>>;
-    // 9-bit code: positions from the start table of subframe 1, set j = 1
-    int16_t p9[2] = {64 + (3 << 3) + 2, 1};
-    const int16_t *c = p9;
-    d.w->subfr_nr = 1;
-    vamrnbd_icb(d.st.get(), d.w.get(), MR475, &c);
-    EXPECT_EQ(c, p9 + 2);
-    EXPECT_EQ(nonzero(), (V{{2 * 5 + 2, 8191}, {3 * 5 + 4, -8192}}));
-
-    // MR122: pitch-gain index first, then ten pulse words; two pulses on one
-    // position of a track add up
-    int16_t p122[11] = {};
-    p122[1] = 8 | 1;  // track 0 at 5 * dgray[1], negative
-    p122[6] = 1;      // second pulse of track 0 at the same place
-    c = p122;
-    vamrnbd_icb(d.st.get(), d.w.get(), MR122, &c);
-    EXPECT_EQ(c, p122 + 11);
-    EXPECT_EQ(d.w->gain_pit, 0);
-    EXPECT_EQ(nonzero(), (V{{1, 8192}, {2, 8192}, {3, 8192}, {4, 8192},
-                            {5 * tab::dgray[1], -8192}}));
 }
 
 }  // namespace

@@ -1,6 +1,5 @@
-// Encoder subframe stages: pitch-gain quantiser and limits, lag search
-// ranges, the gain quantisers' pitch limit, and the correlation kernel's
-// fast path at full scale.
+// Encoder subframe stages: pitch-gain quantiser and limits, and the gain
+// quantisers' pitch limit.
 
 #include <gtest/gtest.h>
 
@@ -64,26 +63,6 @@ TEST(PitchGainQuantiser, NearestEntryAndTieKeepsLowerIndex) {
     EXPECT_EQ(gain, 3276);
 }
 
-TEST(PitchGainQuantiser, Mr795CandidatesShiftInwardsAtTheEnds) {
-    struct {
-        Word16 gain, limit, first;
-    } cases[] = {
-        {0, MAX_16, 0},          // index 0: candidates 0, 1, 2
-        {19661, MAX_16, 13},     // index 15: 13, 14, 15
-        {19661, 15565, 8},       // limited at index 10: 8, 9, 10
-        {13107, MAX_16, 6},      // index 7: 6, 7, 8
-    };
-    for (const auto &c : cases) {
-        Word16 gain = c.gain, cand[3], cind[3];
-        const Word16 idx = vamrnbe_qgain_pitch(MR795, c.limit, &gain, cand, cind);
-        EXPECT_EQ(gain, pitch_tbl[idx]);
-        for (int i = 0; i < 3; ++i) {
-            EXPECT_EQ(cind[i], c.first + i) << "gain " << c.gain;
-            EXPECT_EQ(cand[i], pitch_tbl[c.first + i]);
-        }
-    }
-}
-
 // ---- pitch-gain limits -----------------------------------------------------
 
 TEST(PitchGainLimits, ClippingNeedsASumStrictlyAbove15565) {
@@ -128,34 +107,6 @@ TEST(PitchGainLimits, LowRateModesCapAt13926AndClipOnlyTheQuantiser) {
     Word16 gain = 13927, limit;
     limit_pitch_gain(MR59, 0, quiet, &gain, &limit);
     EXPECT_EQ(gain, 13927);
-}
-
-// ---- lag search ranges -------------------------------------------------------
-
-TEST(LagRange, StaysInsideLimitsWithFullWidth) {
-    Word16 lo, hi;
-    get_range(22, 5, 10, 20, PIT_MAX, &lo, &hi);
-    EXPECT_EQ(lo, 20);
-    EXPECT_EQ(hi, 30);
-    get_range(19, 3, 6, 18, PIT_MAX, &lo, &hi);  // MR122 starts at 18
-    EXPECT_EQ(lo, 18);
-    EXPECT_EQ(hi, 24);
-    get_range(141, 3, 6, 20, PIT_MAX, &lo, &hi);
-    EXPECT_EQ(lo, 137);
-    EXPECT_EQ(hi, 143);
-
-    for (int mode = MR475; mode <= MR122; ++mode) {
-        const int16_t *p = tab::mode_dep_parm + 9 * mode;
-        for (Word16 T = p[8]; T <= PIT_MAX; ++T) {
-            for (int rel = 0; rel < 2; ++rel) {
-                const Word16 low = p[4 + 2 * rel], range = p[5 + 2 * rel];
-                get_range(T, low, range, p[8], PIT_MAX, &lo, &hi);
-                ASSERT_EQ(hi - lo, range);
-                ASSERT_GE(lo, p[8]);
-                ASSERT_LE(hi, PIT_MAX);
-            }
-        }
-    }
 }
 
 // ---- gain quantisers -----------------------------------------------------------

@@ -1,6 +1,6 @@
-// Frame formats: pack/unpack round trips for every frame type the encoder
-// writes, the packer's and the unpacker's special cases, and the decoder
-// homing tests.
+// Frame formats: the packer's and the unpacker's special cases and the
+// decoder homing tests (ordinary frames of every type are pinned by the
+// encoder and decoder streams).
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -53,36 +53,6 @@ Unpacked unpack(const std::vector<uint8_t> &data, uint32_t size) {
 }
 
 }  // namespace
-
-TEST(FrameFormat, PackUnpackRoundTripEveryFrameType) {
-    std::mt19937 rng(21);
-    for (int trial = 0; trial < 50; ++trial) {
-        for (int ft = 0; ft <= 8; ++ft) {
-            const int32_t mode = int32_t(rng() % 8);
-            const int32_t tx = ft < 8 ? TX_SPEECH_GOOD : trial & 1 ? TX_SID_UPDATE : TX_SID_FIRST;
-            const auto prm = random_params(rng, ft);
-            std::vector<uint8_t> out;
-            const uint32_t written = pack(prm, ft, mode, tx, out);
-            ASSERT_EQ(written, uint32_t(vamrnb_tbl_packed_size[ft])) << ft;
-            ASSERT_EQ(out[0], vamrnb_tbl_toc_byte[ft]);
-            ASSERT_EQ(out[written - 1] & ((1 << vamrnb_tbl_unused_size[ft]) - 1), 0) << "padding " << ft;
-
-            const Unpacked u = unpack(out, written);
-            ASSERT_EQ(u.consumed, written) << ft;
-            std::vector<int16_t> back(MAX_PRM, -1);
-            vamrnbd_bits2prm(ft, u.serial.data(), back.data());
-            ASSERT_TRUE(std::equal(prm.begin(), prm.end(), back.begin())) << ft;
-            ASSERT_EQ(u.cls.quality, 1);
-            ASSERT_EQ(u.cls.rx_type, ft < 8 ? RX_SPEECH_GOOD : tx == TX_SID_UPDATE ? RX_SID_UPDATE : RX_SID_FIRST);
-            ASSERT_EQ(u.cls.frame_mode, ft < 8 ? ft : mode);
-        }
-    }
-    std::vector<uint8_t> out;
-    int32_t used = 0;
-    EXPECT_EQ(pack({}, 15, 3, TX_NO_DATA, out, 64, &used), 1u);
-    EXPECT_EQ(out[0], 0x7C);
-    EXPECT_EQ(used, 15);
-}
 
 TEST(FrameFormat, PackerSpecialCases) {
     std::mt19937 rng(8);

@@ -1,22 +1,11 @@
-// Library lifecycle flag, 32-byte-aligned instance memory and the strided
-// block copy.
+// 32-byte-aligned instance memory and the strided block copy (the lifecycle
+// flag is checked by the C program in tests/abi).
 #include <gtest/gtest.h>
 
 #include <cstring>
 #include <vector>
 
 #include "common/memory.h"
-
-TEST(Lifecycle, InitFlagAndPlatformHooks) {
-    EXPECT_EQ(vamrnb_platform_init(nullptr), 0);
-    int32_t word = 77;
-    EXPECT_EQ(vamrnb_platform_init(&word), 0);
-    EXPECT_EQ(word, 0);
-    for (int i = 0; i < 2; ++i) EXPECT_EQ(vamrnb_init(), 0);
-    EXPECT_EQ(vamrnb_inited, 1);
-    for (int i = 0; i < 2; ++i) vamrnb_deinit();
-    EXPECT_EQ(vamrnb_inited, 0);
-}
 
 TEST(Lifecycle, AlignedBlocksKeepTheHeapAddressBelow) {
     std::vector<void *> blocks;

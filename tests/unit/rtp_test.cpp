@@ -213,7 +213,7 @@ TEST(Rtp, EveryBundledStreamRoundTrips) {
     ASSERT_FALSE(streams.empty());
 
     const vamrnb_rtp_params modes[] = {mode_params(0), mode_params(1), mode_params(1, 1)};
-    size_t packets = 0, frames_total = 0, decoded = 0, reserved = 0;
+    size_t packets = 0, frames_total = 0, reserved = 0;
     for (const fs::path &path : streams) {
         std::ifstream f(path, std::ios::binary);
         const bytes file{std::istreambuf_iterator<char>(f), {}};
@@ -240,7 +240,6 @@ TEST(Rtp, EveryBundledStreamRoundTrips) {
         at.push_back(pos);
         frames_total += at.size() - 1;
 
-        bytes carried;
         for (const vamrnb_rtp_params &p : modes)
             for (size_t per : {1, 2, 3, 10}) {
                 bytes joined;
@@ -260,41 +259,11 @@ TEST(Rtp, EveryBundledStreamRoundTrips) {
                     ++packets;
                 }
                 ASSERT_EQ(joined, stream);
-                if (&p == &modes[0] && per == 3) carried = joined;
             }
-
-        // The decoder gives the same output for the stream as it came from
-        // 3-frame bandwidth-efficient packets (NO_DATA for reserved types
-        // included) as for the file itself.
-        codec_config cfg{};
-        cfg.dec.layout = 1;  // 16-bit mono, one interleaved buffer
-        vamrnb_decoder *direct = vamrnbd_create(&cfg, nullptr);
-        vamrnb_decoder *via = vamrnbd_create(&cfg, nullptr);
-        bytes direct_in(file.begin() + 6, file.end());
-        for (size_t k = 0; k + 1 < at.size(); ++k) {
-            const size_t off = at[k];
-            const uint32_t left = static_cast<uint32_t>(carried.size() - off);
-            int16_t pa[160], pb[160];
-            pcm_buffer oa{}, ob{};
-            oa.data[0] = pa;
-            ob.data[0] = pb;
-            bitstream_buffer ia{direct_in.data() + off, 0, left};
-            bitstream_buffer ib{carried.data() + off, 0, left};
-            frame_info ra{}, rb{};
-            const int32_t sa = vamrnbd_decode(direct, &ia, &oa, &ra);
-            ASSERT_EQ(vamrnbd_decode(via, &ib, &ob, &rb), sa);
-            if (sa == AMRNB_OK) {
-                ASSERT_EQ(std::memcmp(pa, pb, sizeof pa), 0) << path << " frame " << k;
-            }
-            ++decoded;
-        }
-        vamrnbd_delete(direct);
-        vamrnbd_delete(via);
     }
     std::printf("rtp round trips: %zu streams, %zu frames, %zu packets over 3 payload modes x "
-                "1/2/3/10 frames per packet (%zu reserved frames sent as NO_DATA); %zu frames decoded "
-                "both ways\n",
-                streams.size(), frames_total, packets, reserved, decoded);
+                "1/2/3/10 frames per packet (%zu reserved frames sent as NO_DATA)\n",
+                streams.size(), frames_total, packets, reserved);
 }
 
 TEST(Rtp, ModeRequestsDriveTheEncoder) {

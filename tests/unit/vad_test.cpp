@@ -1,9 +1,8 @@
-// Voice activity detectors: band splitting, low-power and hangover rules of
-// option 1, the option-2 transform, and the per-frame entry point's option
-// dispatch.  (Bit-exactness is shown by the conformance vectors.)
+// Voice activity detectors: the low-power and hangover rules of option 1 and
+// the per-frame entry point's option dispatch.  (Bit-exactness is shown by
+// the encoder streams.)
 #include <gtest/gtest.h>
 
-#include <cmath>
 #include <cstring>
 #include <random>
 #include <vector>
@@ -14,8 +13,6 @@
 using namespace vamrnb;
 
 namespace {
-
-constexpr double PI = 3.14159265358979323846;
 
 // A frame buffer with 40 samples of history in front of the 160 new ones, as
 // the detector reads them.
@@ -36,42 +33,9 @@ struct noise_gen {
     Word16 operator()() { return static_cast<Word16>(d(rng)); }
 };
 
-struct sine_gen {
-    double w, amp;
-    long n = 0;
-    sine_gen(double hz, double a) : w(2 * PI * hz / 8000.0), amp(a) {}
-    Word16 operator()() { return static_cast<Word16>(std::lround(amp * std::sin(w * n++))); }
-};
-
-int argmax_level(const vad1_state &st) {
-    int best = 0;
-    for (int i = 1; i < VAD_BANDS; ++i)
-        if (st.old_level[i] > st.old_level[best]) best = i;
-    return best;
-}
-
 }  // namespace
 
 // ---- option 1 -------------------------------------------------------------------
-
-// Each band of the filter bank must collect the tone that falls into it.
-TEST(Vad1, FilterBankPutsTonesInTheirBands) {
-    const struct { double hz; int band; } cases[] = {
-        {120, 0}, {375, 1}, {625, 2}, {875, 3}, {1250, 4},
-        {1750, 5}, {2250, 6}, {2750, 7}, {3500, 8},
-    };
-    for (const auto &c : cases) {
-        vad1_state st;
-        vad1_init(&st);
-        frame_buf buf;
-        sine_gen g(c.hz, 8000);
-        for (int f = 0; f < 4; ++f) {
-            buf.next(g);
-            vad1(&st, buf.fresh());
-        }
-        EXPECT_EQ(argmax_level(st), c.band) << c.hz << " Hz";
-    }
-}
 
 // Frames below the power floor decide 0 and drop every pending hangover,
 // whatever the band SNRs say.
@@ -157,34 +121,6 @@ TEST(Vad1, LongCorrelatedBackgroundForcesSpeech) {
         ++ones;
     }
     EXPECT_GE(ones, 249);
-}
-
-// ---- option 2 -------------------------------------------------------------------
-
-// The transform equals a 128-point DFT of the real input divided by 64.
-TEST(Vad2, RealFftMatchesDft) {
-    std::mt19937 rng(7);
-    std::uniform_int_distribution<int> d(-4000, 4000);
-    for (int trial = 0; trial < 3; ++trial) {
-        Word16 x[128];
-        std::vector<double> in(128);
-        for (int i = 0; i < 128; ++i) in[i] = x[i] = static_cast<Word16>(d(rng));
-        r_fft(x);
-        auto dft = [&](int k, bool im) {
-            double acc = 0;
-            for (int n = 0; n < 128; ++n) {
-                const double a = 2 * PI * k * n / 128;
-                acc += in[n] * (im ? -std::sin(a) : std::cos(a));
-            }
-            return acc / 64;
-        };
-        EXPECT_NEAR(x[0], dft(0, false), 4);
-        EXPECT_NEAR(x[1], dft(64, false), 4);
-        for (int k = 1; k < 64; ++k) {
-            EXPECT_NEAR(x[2 * k], dft(k, false), 4) << k;
-            EXPECT_NEAR(x[2 * k + 1], dft(k, true), 4) << k;
-        }
-    }
 }
 
 // ---- the per-frame entry point ----------------------------------------------------
