@@ -20,7 +20,6 @@ constexpr Word16 Q15_EIGHTH = 4096;     // 1/8
 constexpr Word16 Q15_SIXTEENTH = 2048;  // 1/16
 constexpr int STEP = 5;
 
-using matrix = Word16[L_CODE][L_CODE];
 
 // Signs of dn (dn becomes |dn|); dn2 keeps, per track, the n largest
 // magnitudes and marks the 8 - n smallest with -1.
@@ -61,7 +60,7 @@ struct track_terms {
     Word32 dn_max;
 };
 
-void gather_track(const Word16 *dn, const matrix &rr, int t, Word16 w, track_terms &out) {
+void gather_track(const Word16 *dn, const Word16 rr[L_CODE][L_CODE], int t, Word16 w, track_terms &out) {
     for (int j = 0, i = t; j < N_POS; ++j, i += STEP) {
         out.dn[j] = dn[i];
         out.diag[j] = Word32{rr[i][i]} * (2 * w);
@@ -70,7 +69,7 @@ void gather_track(const Word16 *dn, const matrix &rr, int t, Word16 w, track_ter
 }
 
 // e[j] += 2·w·rr[row][t + 5j]
-void add_row(Word32 *e, const matrix &rr, int row, int t, Word16 w) {
+void add_row(Word32 *e, const Word16 rr[L_CODE][L_CODE], int row, int t, Word16 w) {
     const Word16 *r = rr[row] + t;
     for (int j = 0; j < N_POS; ++j) e[j] += r[j * STEP] * (2 * w);
 }
@@ -78,7 +77,7 @@ void add_row(Word32 *e, const matrix &rr, int row, int t, Word16 w) {
 // Two pulses: first on the track starting at p0, second at p1.  The energy
 // of a pair is rr00/4 + rr11/4 + rr01/2 in Q31 (|.| <= 2^28 + 2^28 + 2^30,
 // plus the rounding term, below 2^31), so it is a plain sum.
-void search_pair(const Word16 *dn, const matrix &rr, int p0, int p1, Word16 &psk,
+void search_pair(const Word16 *dn, const Word16 rr[L_CODE][L_CODE], int p0, int p1, Word16 &psk,
                  Word16 &alpk, Word16 *codvec) {
     track_terms t1;
     gather_track(dn, rr, p1, Q15_QUARTER, t1);
@@ -102,7 +101,7 @@ void search_pair(const Word16 *dn, const matrix &rr, int p0, int p1, Word16 &psk
 // (2^28 + 2^27 + 2 * 2^28) are plain sums with room for the rounding; the
 // fourth starts from the third's energy in the high half and is a plain sum
 // only while that energy leaves room (checked per first pulse).
-void search_multi(int n_pulse, const Word16 *dn, const Word16 *dn2, const matrix &rr,
+void search_multi(int n_pulse, const Word16 *dn, const Word16 *dn2, const Word16 rr[L_CODE][L_CODE],
                   const int *ipos, Word16 &psk, Word16 &alpk, Word16 *codvec) {
     track_terms t1, t2, t3;
     gather_track(dn, rr, ipos[1], Q15_QUARTER, t1);
@@ -196,6 +195,50 @@ void filter_pulses(const Word16 *h, const Word16 *codvec, const Word16 *signs, i
     }
 }
 
+void search_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *dn, const Word16 *dn2,
+                    const Word16 rr[L_CODE][L_CODE], Word16 *codvec) {
+    for (int k = 0; k < 4; ++k) codvec[k] = static_cast<Word16>(k);
+    Word16 psk = -1, alpk = 1;
+    if (mode == MR475 || mode == MR515) {
+        for (int t = 0; t < 2; ++t) {
+            search_pair(dn, rr, tab::startPos[subfr_nr * 2 + 8 * t],
+                        tab::startPos[subfr_nr * 2 + 1 + 8 * t], psk, alpk, codvec);
+        }
+        return;
+    }
+    if (mode == MR59) {
+        for (int t1 = 0; t1 < 2; ++t1) {
+            for (int t2 = 0; t2 < 4; ++t2) {
+                search_pair(dn, rr, tab::startPos1[t1], tab::startPos2[t2], psk, alpk, codvec);
+            }
+        }
+        return;
+    }
+    // Each start of the track order is searched with the order rotated
+    // through all pulses.
+    const auto rotations = [&](int n, int *ipos) {
+        for (int r = 0; r < n; ++r) {
+            search_multi(n, dn, dn2, rr, ipos, psk, alpk, codvec);
+            const int last = ipos[n - 1];
+            for (int q = n - 1; q > 0; --q) ipos[q] = ipos[q - 1];
+            ipos[0] = last;
+        }
+    };
+    if (mode == MR67) {
+        for (int t1 = 1; t1 < 4; t1 += 2) {
+            for (int t2 = 2; t2 < 5; t2 += 2) {
+                int ipos[3] = {0, t1, t2};
+                rotations(3, ipos);
+            }
+        }
+    } else {
+        for (int t = 3; t < 5; ++t) {
+            int ipos[4] = {0, 1, 2, t};
+            rotations(4, ipos);
+        }
+    }
+}
+
 Word16 code_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *x, Word16 *h, Word16 T0,
                     Word16 pitch_sharp, Word16 *code, Word16 *y, Word16 *sign_word) {
     const Word16 sharp = shl(pitch_sharp, 1);
@@ -218,45 +261,8 @@ Word16 code_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *x, Word16 *h, 
     set_sign(dn, dn_sign, dn2, n_pulse == 2 ? 8 : (n_pulse == 3 ? 6 : 4));
     cor_h(h, dn_sign, rr);
 
-    Word16 codvec[4] = {0, 1, 2, 3};
-    Word16 psk = -1, alpk = 1;
-    if (mode == MR475 || mode == MR515) {
-        for (int t = 0; t < 2; ++t) {
-            search_pair(dn, rr, tab::startPos[subfr_nr * 2 + 8 * t],
-                        tab::startPos[subfr_nr * 2 + 1 + 8 * t], psk, alpk, codvec);
-        }
-    } else if (mode == MR59) {
-        for (int t1 = 0; t1 < 2; ++t1) {
-            for (int t2 = 0; t2 < 4; ++t2) {
-                search_pair(dn, rr, tab::startPos1[t1], tab::startPos2[t2], psk, alpk, codvec);
-            }
-        }
-    } else if (mode == MR67) {
-        for (int t1 = 1; t1 < 4; t1 += 2) {
-            for (int t2 = 2; t2 < 5; t2 += 2) {
-                int ipos[3] = {0, t1, t2};
-                for (int r = 0; r < 3; ++r) {
-                    search_multi(3, dn, dn2, rr, ipos, psk, alpk, codvec);
-                    const int last = ipos[2];
-                    ipos[2] = ipos[1];
-                    ipos[1] = ipos[0];
-                    ipos[0] = last;
-                }
-            }
-        }
-    } else {
-        for (int t = 3; t < 5; ++t) {
-            int ipos[4] = {0, 1, 2, t};
-            for (int r = 0; r < 4; ++r) {
-                search_multi(4, dn, dn2, rr, ipos, psk, alpk, codvec);
-                const int last = ipos[3];
-                ipos[3] = ipos[2];
-                ipos[2] = ipos[1];
-                ipos[1] = ipos[0];
-                ipos[0] = last;
-            }
-        }
-    }
+    Word16 codvec[4];
+    search_lowrate(mode, subfr_nr, dn, dn2, rr, codvec);
 
     // Code vector, signs and the position index.
     for (int i = 0; i < L_CODE; ++i) code[i] = 0;

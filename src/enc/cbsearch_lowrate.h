@@ -80,6 +80,12 @@ inline Word32 max_mag(const Word16 *v, int n) {
 void filter_pulses(const Word16 *h, const Word16 *codvec, const Word16 *signs, int n,
                    Word16 *y);
 
+// Pulse positions of the two-, three- and four-pulse codebooks from |dn|,
+// the candidate marks dn2 (negative: not a first pulse) and the signed
+// correlation matrix.
+void search_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *dn, const Word16 *dn2,
+                    const Word16 rr[L_CODE][L_CODE], Word16 *codvec);
+
 // Two-, three- and four-pulse codebooks (modes MR475..MR795); h[-39..-1]
 // must be readable and zero.  Sharpens h
 // (in place) and the code vector when T0 < 40, writes the code vector and
