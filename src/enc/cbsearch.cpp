@@ -317,9 +317,11 @@ void energy_terms(Word32 init, Word16 w_self, Word16 w_cross, const Word16 rr[L_
     if (worst <= MAX_32) {
         for (int j = 0; j < N; ++j) {
             const int i = t + step * j;
-            Word32 s = init + rr[i][i] * (2 * w_self);
-            for (int q = 0; q < na; ++q) s += rr[p[q]][i] * (2 * w_cross);
-            out[j] = s;
+            out[j] = init + rr[i][i] * (2 * w_self);
+        }
+        for (int q = 0; q < na; ++q) {
+            const Word16 *row = rr[p[q]] + t;
+            for (int j = 0; j < N; ++j) out[j] += row[step * j] * (2 * w_cross);
         }
         return;
     }
