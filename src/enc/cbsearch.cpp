@@ -174,9 +174,10 @@ namespace {
 // vamrnbe_cor_h_sign).  Row j = L_CODE-1-k holds, at column i <= j, the sum
 // of 2·h2[m]·h2[m+j-i] over m <= k.  The running sum of lag d sits in
 // acc[L_CODE-1-d], so row j reads acc[k + i] for i = 0..j: each row is one
-// forward pass over contiguous arrays; the upper triangle is mirrored after.  Products |h2·h2| stay below 2^30 (a -32768 would
-// break the energy bound), and mult of two 16-bit values is never below
-// -32767, so the product of the rounded sum and the sign product is exact.
+// forward pass over contiguous arrays that also fills column j.  Products
+// |h2·h2| stay below 2^30 (a -32768 would break the energy bound), and mult
+// of two 16-bit values is never below -32767, so the product of the rounded
+// sum and the sign product is exact.
 void cor_h_sign_plain(const Word16 *h2, const Word16 *sign, Word16 *rr) {
     Word16 h2_rev[L_CODE];
     for (int m = 0; m < L_CODE; ++m) h2_rev[m] = h2[L_CODE - 1 - m];
@@ -190,13 +191,13 @@ void cor_h_sign_plain(const Word16 *h2, const Word16 *sign, Word16 *rr) {
         for (int i = 0; i < j; ++i) {
             a[i] += hk2 * h2_rev[i];
             const Word32 r = (a[i] + 0x8000) >> 16;
-            rr_row[i] = static_cast<Word16>((r * mult(sign[i], sj)) >> 15);
+            const Word16 v = static_cast<Word16>((r * mult(sign[i], sj)) >> 15);
+            rr_row[i] = v;
+            rr[i * L_CODE + j] = v;
         }
         a[j] += hk2 * h2_rev[j];
         rr_row[j] = static_cast<Word16>((a[j] + 0x8000) >> 16);
     }
-    for (int i = 0; i < L_CODE; ++i)
-        for (int j = i + 1; j < L_CODE; ++j) rr[i * L_CODE + j] = rr[j * L_CODE + i];
 }
 
 }  // namespace
