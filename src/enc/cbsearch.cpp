@@ -17,6 +17,9 @@
 #include "lpc/kernel_common.h"
 #include "lpc/tables.h"
 
+#include <algorithm>
+#include <cstdlib>
+
 namespace vamrnb {
 namespace {
 
@@ -171,9 +174,10 @@ namespace {
 // vamrnbe_cor_h_sign).  Row j = L_CODE-1-k holds, at column i <= j, the sum
 // of 2·h2[m]·h2[m+j-i] over m <= k.  The running sum of lag d sits in
 // acc[L_CODE-1-d], so row j reads acc[k + i] for i = 0..j: each row is one
-// forward pass over contiguous arrays; the upper triangle is mirrored after.  Products |h2·h2| stay below 2^30 (a -32768 would
-// break the energy bound), and mult of two 16-bit values is never below
-// -32767, so the product of the rounded sum and the sign product is exact.
+// forward pass over contiguous arrays that also fills column j.  Products
+// |h2·h2| stay below 2^30 (a -32768 would break the energy bound), and mult
+// of two 16-bit values is never below -32767, so the product of the rounded
+// sum and the sign product is exact.
 void cor_h_sign_plain(const Word16 *h2, const Word16 *sign, Word16 *rr) {
     Word16 h2_rev[L_CODE];
     for (int m = 0; m < L_CODE; ++m) h2_rev[m] = h2[L_CODE - 1 - m];
@@ -187,13 +191,13 @@ void cor_h_sign_plain(const Word16 *h2, const Word16 *sign, Word16 *rr) {
         for (int i = 0; i < j; ++i) {
             a[i] += hk2 * h2_rev[i];
             const Word32 r = (a[i] + 0x8000) >> 16;
-            rr_row[i] = static_cast<Word16>((r * mult(sign[i], sj)) >> 15);
+            const Word16 v = static_cast<Word16>((r * mult(sign[i], sj)) >> 15);
+            rr_row[i] = v;
+            rr[i * L_CODE + j] = v;
         }
         a[j] += hk2 * h2_rev[j];
         rr_row[j] = static_cast<Word16>((a[j] + 0x8000) >> 16);
     }
-    for (int i = 0; i < L_CODE; ++i)
-        for (int j = i + 1; j < L_CODE; ++j) rr[i * L_CODE + j] = rr[j * L_CODE + i];
 }
 
 }  // namespace
@@ -296,25 +300,130 @@ void set_sign12k2(Word16 *dn, const Word16 *cn, Word16 *sign, Word16 *pos_max,
     }
 }
 
+namespace {
+
+// Energy terms of the candidates of one track (positions t + step·j):
+// out[j] = init + rr[i][i]·2·w_self + sum over the fixed pulses p[q] of
+// rr[p[q]][i]·2·w_cross, as the saturating multiply-accumulate chain gives
+// it.  When |init| plus the largest possible terms (|rr| <= 32768) fits 32
+// bits, no partial sum of the chain can saturate and the plain sum is the
+// result.  Otherwise the magnitudes of the actual terms are summed too
+// (while they cannot wrap 32 unsigned bits) and only the candidates whose
+// magnitudes do not fit run the chain as written.
+template <int N>
+void energy_terms(Word32 init, Word16 w_self, Word16 w_cross, const Word16 rr[L_CODE][L_CODE],
+                  const int *p, int na, int t, int step, Word32 *out) {
+    const uint32_t init_mag = init < 0 ? 0u - static_cast<uint32_t>(init) : init;
+    const int64_t worst = init_mag + int64_t{65536} * (w_self + na * w_cross);
+    if (worst <= MAX_32) {
+        for (int j = 0; j < N; ++j) {
+            const int i = t + step * j;
+            out[j] = init + rr[i][i] * (2 * w_self);
+        }
+        for (int q = 0; q < na; ++q) {
+            const Word16 *row = rr[p[q]] + t;
+            for (int j = 0; j < N; ++j) out[j] += row[step * j] * (2 * w_cross);
+        }
+        return;
+    }
+    for (int j = 0; j < N; ++j) {
+        const int i = t + step * j;
+        const Word32 d = rr[i][i] * (2 * w_self);
+        uint32_t s = static_cast<uint32_t>(init) + static_cast<uint32_t>(d);
+        uint32_t mag = init_mag + static_cast<uint32_t>(d < 0 ? -d : d);
+        for (int q = 0; q < na; ++q) {
+            const Word32 v = rr[p[q]][i] * (2 * w_cross);
+            s += static_cast<uint32_t>(v);
+            mag += static_cast<uint32_t>(v < 0 ? -v : v);
+        }
+        if (worst <= UINT32_MAX && mag <= static_cast<uint32_t>(MAX_32)) {
+            out[j] = static_cast<Word32>(s);
+        } else {
+            Word32 c = l_mac(init, rr[i][i], w_self);
+            for (int q = 0; q < na; ++q) c = l_mac(c, rr[p[q]][i], w_cross);
+            out[j] = c;
+        }
+    }
+}
+
+// Weights of the energy terms per pair level (pulses 2-3, 4-5, 6-7, 8-9):
+// new second pulse with itself and the fixed pulses (folded into rrv),
+// first pulse with itself and the fixed pulses, rrv, and the pair itself.
+constexpr Word16 rrv_self[4] = {Q15_8TH, Q15_8TH, Q15_16TH, Q15_16TH};
+constexpr Word16 rrv_cross[4] = {Q15_QUARTER, Q15_QUARTER, Q15_8TH, Q15_8TH};
+constexpr Word16 a_self[4] = {Q15_16TH, Q15_32ND, Q15_64TH, Q15_128TH};
+constexpr Word16 a_cross[4] = {Q15_8TH, Q15_16TH, Q15_32ND, Q15_64TH};
+constexpr Word16 b_vec[4] = {Q15_HALF, Q15_QUARTER, Q15_QUARTER, Q15_8TH};
+constexpr Word16 ab_cross[4] = {Q15_8TH, Q15_16TH, Q15_32ND, Q15_64TH};
+
+// One pair level: the best pair of positions on tracks ta and tb (N
+// positions each, stride step) added to the na pulses fixed in p, starting
+// from the pulse sum ps0 and energy alp0 of those.  Writes the pair to
+// p[na], p[na + 1] and returns the level's criterion in best.
+template <int N>
+void pair_level(int lv, int step, const Word16 *dn, const Word16 rr[L_CODE][L_CODE], int *p,
+                int na, int ta, int tb, Word16 ps0, Word32 alp0, search_best &best) {
+    // Second pulse with itself and the fixed pulses, rounded.
+    Word32 rrv32[N], alp1[N], rrv2[N];
+    energy_terms<N>(0, rrv_self[lv], rrv_cross[lv], rr, p, na, tb, step, rrv32);
+    for (int j = 0; j < N; ++j) rrv2[j] = Word32{round16(rrv32[j])} * (2 * b_vec[lv]);
+    // First pulse with itself and the fixed pulses.
+    energy_terms<N>(alp0, a_self[lv], a_cross[lv], rr, p, na, ta, step, alp1);
+
+    // The pair energy alp1 + rrv2 + 2·ab·rr[ia][ib] is a plain sum when
+    // the largest magnitudes of its terms and the rounding fit 32 bits.
+    int64_t max_alp1 = 0, max_rrv2 = 0;
+    for (int j = 0; j < N; ++j) {
+        max_alp1 = std::max(max_alp1, std::abs(int64_t{alp1[j]}));
+        max_rrv2 = std::max(max_rrv2, std::abs(int64_t{rrv2[j]}));
+    }
+    const Word32 ab2 = 2 * ab_cross[lv];
+    const bool plain = max_alp1 + max_rrv2 + int64_t{32768} * ab2 + 0x8000 <= MAX_32;
+
+    Word16 dnb[N];
+    for (int j = 0; j < N; ++j) dnb[j] = dn[tb + step * j];
+    const Word32 dnb_max = max_mag(dnb, N);
+    best = search_best{};
+    int best_a = 0, best_b = 0;
+    for (int a = 0; a < N; ++a) {
+        const int ia = ta + step * a;
+        const Word16 ps1 = add(ps0, dn[ia]);
+        const Word16 *row = rr[ia] + tb;
+        if (plain) {
+            Word32 e[N];
+            for (int j = 0; j < N; ++j) e[j] = rrv2[j] + row[j * step] * ab2;
+            pick_best<N>(ps1, alp1[a], dnb, e, dnb_max, N * a, best);
+            best_a = best.idx / N;
+            best_b = best.idx % N;
+            continue;
+        }
+        for (int j = 0; j < N; ++j) {
+            const Word16 ps2 = add(ps1, dnb[j]);
+            Word32 alp2 = l_add(alp1[a], rrv2[j]);
+            alp2 = l_mac(alp2, row[j * step], ab_cross[lv]);
+            const Word16 sq2 = mult(ps2, ps2);
+            const Word16 alp_16 = round16(alp2);
+            if (better(sq2, alp_16, best.sq, best.alp)) {
+                best.sq = sq2;
+                best.ps = ps2;
+                best.alp = alp_16;
+                best_a = a;
+                best_b = j;
+            }
+        }
+    }
+    p[na] = ta + step * best_a;
+    p[na + 1] = tb + step * best_b;
+}
+
+}  // namespace
+
 void search_10and8i40(Word16 nb_pulse, Word16 step, Word16 nb_tracks, const Word16 *dn,
                       const Word16 rr[L_CODE][L_CODE], Word16 *ipos, const Word16 *pos_max,
                       Word16 *codvec) {
-    const bool ten = nb_pulse == 10;
-    Word16 rrv[L_CODE];
-
     const int i0 = pos_max[ipos[0]];
     Word16 psk = -1, alpk = 1;
     for (int i = 0; i < nb_pulse; ++i) codvec[i] = static_cast<Word16>(i);
-
-    // Weights of the energy terms per pair level (pulses 2-3, 4-5, 6-7, 8-9):
-    // new second pulse with itself and the fixed pulses (folded into rrv),
-    // first pulse with itself and the fixed pulses, rrv, and the pair itself.
-    static constexpr Word16 rrv_self[4] = {Q15_8TH, Q15_8TH, Q15_16TH, Q15_16TH};
-    static constexpr Word16 rrv_cross[4] = {Q15_QUARTER, Q15_QUARTER, Q15_8TH, Q15_8TH};
-    static constexpr Word16 a_self[4] = {Q15_16TH, Q15_32ND, Q15_64TH, Q15_128TH};
-    static constexpr Word16 a_cross[4] = {Q15_8TH, Q15_16TH, Q15_32ND, Q15_64TH};
-    static constexpr Word16 b_vec[4] = {Q15_HALF, Q15_QUARTER, Q15_QUARTER, Q15_8TH};
-    static constexpr Word16 ab_cross[4] = {Q15_8TH, Q15_16TH, Q15_32ND, Q15_64TH};
 
     for (int t = 1; t < nb_tracks; ++t) {
         int p[10];
@@ -325,51 +434,26 @@ void search_10and8i40(Word16 nb_pulse, Word16 step, Word16 nb_tracks, const Word
         alp0 = l_mac(alp0, rr[p[1]][p[1]], Q15_16TH);
         alp0 = l_mac(alp0, rr[p[0]][p[1]], Q15_8TH);
 
-        Word16 sq = -1, alp = 1, ps = 0;
-        const int levels = ten ? 4 : 3;
+        search_best best;
+        const int levels = nb_pulse == 10 ? 4 : 3;
         for (int lv = 0; lv < levels; ++lv) {
-            const int na = 2 + 2 * lv;      // pulses fixed before this pair
-            const int ta = ipos[na], tb = ipos[na + 1];
+            const int na = 2 + 2 * lv;  // pulses fixed before this pair
             if (lv > 0) {
-                ps0 = ps;
-                alp0 = l_mult(alp, Q15_HALF);
+                ps0 = best.ps;
+                alp0 = l_mult(best.alp, Q15_HALF);
             }
-            // Energy terms of the second pulse with all fixed pulses.
-            for (int ib = tb; ib < L_CODE; ib += step) {
-                Word32 s = l_mult(rr[ib][ib], rrv_self[lv]);
-                for (int q = 0; q < na; ++q) s = l_mac(s, rr[p[q]][ib], rrv_cross[lv]);
-                rrv[ib] = round16(s);
+            if (step == 5) {
+                pair_level<L_CODE / 5>(lv, step, dn, rr, p, na, ipos[na], ipos[na + 1], ps0,
+                                       alp0, best);
+            } else {
+                pair_level<L_CODE / 4>(lv, step, dn, rr, p, na, ipos[na], ipos[na + 1], ps0,
+                                       alp0, best);
             }
-            sq = -1;
-            alp = 1;
-            ps = 0;
-            int best_a = ta, best_b = tb;
-            for (int ia = ta; ia < L_CODE; ia += step) {
-                const Word16 ps1 = add(ps0, dn[ia]);
-                Word32 alp1 = l_mac(alp0, rr[ia][ia], a_self[lv]);
-                for (int q = 0; q < na; ++q) alp1 = l_mac(alp1, rr[p[q]][ia], a_cross[lv]);
-                for (int ib = tb; ib < L_CODE; ib += step) {
-                    const Word16 ps2 = add(ps1, dn[ib]);
-                    Word32 alp2 = l_mac(alp1, rrv[ib], b_vec[lv]);
-                    alp2 = l_mac(alp2, rr[ia][ib], ab_cross[lv]);
-                    const Word16 sq2 = mult(ps2, ps2);
-                    const Word16 alp_16 = round16(alp2);
-                    if (better(sq2, alp_16, sq, alp)) {
-                        sq = sq2;
-                        ps = ps2;
-                        alp = alp_16;
-                        best_a = ia;
-                        best_b = ib;
-                    }
-                }
-            }
-            p[na] = best_a;
-            p[na + 1] = best_b;
         }
 
-        if (better(sq, alp, psk, alpk)) {
-            psk = sq;
-            alpk = alp;
+        if (better(best.sq, best.alp, psk, alpk)) {
+            psk = best.sq;
+            alpk = best.alp;
             for (int k = 0; k < nb_pulse; ++k) codvec[k] = static_cast<Word16>(p[k]);
         }
 

@@ -9,6 +9,8 @@
 
 #include "lpc/tables.h"
 
+#include <cstdlib>
+
 namespace vamrnb {
 namespace {
 
@@ -18,7 +20,6 @@ constexpr Word16 Q15_EIGHTH = 4096;     // 1/8
 constexpr Word16 Q15_SIXTEENTH = 2048;  // 1/16
 constexpr int STEP = 5;
 
-using matrix = Word16[L_CODE][L_CODE];
 
 // Signs of dn (dn becomes |dn|); dn2 keeps, per track, the n largest
 // magnitudes and marks the 8 - n smallest with -1.
@@ -49,116 +50,128 @@ void set_sign(Word16 *dn, Word16 *sign, Word16 *dn2, int n) {
     }
 }
 
-// Two pulses: first on the track starting at p0, second at p1.
-void search_pair(const Word16 *dn, const matrix &rr, int p0, int p1, Word16 &psk,
+constexpr int N_POS = L_CODE / STEP;  // positions per track
+
+// Candidates of one track (positions t, t + 5, ...): their dn values and,
+// for the energy, the diagonal of rr scaled by 2·w.
+struct track_terms {
+    Word16 dn[N_POS];
+    Word32 diag[N_POS];
+    Word32 dn_max;
+};
+
+void gather_track(const Word16 *dn, const Word16 rr[L_CODE][L_CODE], int t, Word16 w, track_terms &out) {
+    for (int j = 0, i = t; j < N_POS; ++j, i += STEP) {
+        out.dn[j] = dn[i];
+        out.diag[j] = Word32{rr[i][i]} * (2 * w);
+    }
+    out.dn_max = max_mag(out.dn, N_POS);
+}
+
+// e[j] += 2·w·rr[row][t + 5j]
+void add_row(Word32 *e, const Word16 rr[L_CODE][L_CODE], int row, int t, Word16 w) {
+    const Word16 *r = rr[row] + t;
+    for (int j = 0; j < N_POS; ++j) e[j] += r[j * STEP] * (2 * w);
+}
+
+// Two pulses: first on the track starting at p0, second at p1.  The energy
+// of a pair is rr00/4 + rr11/4 + rr01/2 in Q31 (|.| <= 2^28 + 2^28 + 2^30,
+// plus the rounding term, below 2^31), so it is a plain sum.
+void search_pair(const Word16 *dn, const Word16 rr[L_CODE][L_CODE], int p0, int p1, Word16 &psk,
                  Word16 &alpk, Word16 *codvec) {
+    track_terms t1;
+    gather_track(dn, rr, p1, Q15_QUARTER, t1);
     for (int i0 = p0; i0 < L_CODE; i0 += STEP) {
-        const Word16 ps0 = dn[i0];
-        const Word32 alp0 = l_mult(rr[i0][i0], Q15_QUARTER);
-        Word16 sq = -1, alp = 1;
-        int ix = p1;
-        for (int i1 = p1; i1 < L_CODE; i1 += STEP) {
-            const Word16 ps1 = add(ps0, dn[i1]);
-            Word32 alp1 = l_mac(alp0, rr[i1][i1], Q15_QUARTER);
-            alp1 = l_mac(alp1, rr[i0][i1], Q15_HALF);
-            const Word16 sq1 = mult(ps1, ps1);
-            const Word16 alp_16 = round16(alp1);
-            if (better(sq1, alp_16, sq, alp)) {
-                sq = sq1;
-                alp = alp_16;
-                ix = i1;
-            }
-        }
-        if (better(sq, alp, psk, alpk)) {
-            psk = sq;
-            alpk = alp;
+        Word32 e[N_POS];
+        for (int j = 0; j < N_POS; ++j) e[j] = t1.diag[j];
+        add_row(e, rr, i0, p1, Q15_HALF);
+        search_best best;
+        pick_best<N_POS>(dn[i0], l_mult(rr[i0][i0], Q15_QUARTER), t1.dn, e, t1.dn_max, 0, best);
+        if (better(best.sq, best.alp, psk, alpk)) {
+            psk = best.sq;
+            alpk = best.alp;
             codvec[0] = static_cast<Word16>(i0);
-            codvec[1] = static_cast<Word16>(ix);
+            codvec[1] = static_cast<Word16>(p1 + STEP * best.idx);
         }
     }
 }
 
-// Three or four pulses, the later pulses chosen one track at a time.
-void search_multi(int n_pulse, const Word16 *dn, const Word16 *dn2, const matrix &rr,
+// Three or four pulses, the later pulses chosen one track at a time.  The
+// energies of the second pulse (|.| <= 2^28 + 2^28 + 2^30) and of the third
+// (2^28 + 2^27 + 2 * 2^28) are plain sums with room for the rounding; the
+// fourth starts from the third's energy in the high half and is a plain sum
+// only while that energy leaves room (checked per first pulse).
+void search_multi(int n_pulse, const Word16 *dn, const Word16 *dn2, const Word16 rr[L_CODE][L_CODE],
                   const int *ipos, Word16 &psk, Word16 &alpk, Word16 *codvec) {
+    track_terms t1, t2, t3;
+    gather_track(dn, rr, ipos[1], Q15_QUARTER, t1);
+    gather_track(dn, rr, ipos[2], Q15_SIXTEENTH, t2);
+    if (n_pulse == 4) gather_track(dn, rr, ipos[3], Q15_SIXTEENTH, t3);
+    // Largest fourth-pulse energy terms: the diagonal plus three rows.
+    constexpr Word32 ROOM4 = MAX_32 - 0x8000 - 32768 * 2 * Q15_SIXTEENTH
+                             - 3 * (32768 * 2 * Q15_EIGHTH);
+
     for (int i0 = ipos[0]; i0 < L_CODE; i0 += STEP) {
         if (dn2[i0] < 0) continue;
+        Word32 e[N_POS];
 
         // Second pulse.
-        Word16 ps0 = dn[i0];
-        Word32 alp0 = l_mult(rr[i0][i0], Q15_QUARTER);
-        Word16 sq = -1, alp = 1, ps = 0;
-        int ix = ipos[1];
-        for (int i1 = ipos[1]; i1 < L_CODE; i1 += STEP) {
-            const Word16 ps1 = add(ps0, dn[i1]);
-            Word32 alp1 = l_mac(alp0, rr[i1][i1], Q15_QUARTER);
-            alp1 = l_mac(alp1, rr[i0][i1], Q15_HALF);
-            const Word16 sq1 = mult(ps1, ps1);
-            const Word16 alp_16 = round16(alp1);
-            if (better(sq1, alp_16, sq, alp)) {
-                sq = sq1;
-                ps = ps1;
-                alp = alp_16;
-                ix = i1;
-            }
-        }
-        const int i1 = ix;
+        for (int j = 0; j < N_POS; ++j) e[j] = t1.diag[j];
+        add_row(e, rr, i0, ipos[1], Q15_HALF);
+        search_best best;
+        pick_best<N_POS>(dn[i0], l_mult(rr[i0][i0], Q15_QUARTER), t1.dn, e, t1.dn_max, 0, best);
+        const int i1 = ipos[1] + STEP * best.idx;
 
         // Third pulse.
-        ps0 = ps;
-        alp0 = l_mult(alp, Q15_QUARTER);
-        sq = -1;
-        alp = 1;
-        ps = 0;
-        ix = ipos[2];
-        for (int i2 = ipos[2]; i2 < L_CODE; i2 += STEP) {
-            const Word16 ps1 = add(ps0, dn[i2]);
-            Word32 alp1 = l_mac(alp0, rr[i2][i2], Q15_SIXTEENTH);
-            alp1 = l_mac(alp1, rr[i1][i2], Q15_EIGHTH);
-            alp1 = l_mac(alp1, rr[i0][i2], Q15_EIGHTH);
-            const Word16 sq1 = mult(ps1, ps1);
-            const Word16 alp_16 = round16(alp1);
-            if (better(sq1, alp_16, sq, alp)) {
-                sq = sq1;
-                ps = ps1;
-                alp = alp_16;
-                ix = i2;
-            }
-        }
-        const int i2 = ix;
+        for (int j = 0; j < N_POS; ++j) e[j] = t2.diag[j];
+        add_row(e, rr, i1, ipos[2], Q15_EIGHTH);
+        add_row(e, rr, i0, ipos[2], Q15_EIGHTH);
+        Word16 ps0 = best.ps;
+        Word32 alp0 = l_mult(best.alp, Q15_QUARTER);
+        best = search_best{};
+        pick_best<N_POS>(ps0, alp0, t2.dn, e, t2.dn_max, 0, best);
+        const int i2 = ipos[2] + STEP * best.idx;
 
+        int i3 = 0;
         if (n_pulse == 4) {
             // Fourth pulse.
-            ps0 = ps;
-            alp0 = l_deposit_h(alp);
-            sq = -1;
-            alp = 1;
-            ps = 0;
-            ix = ipos[3];
-            for (int i3 = ipos[3]; i3 < L_CODE; i3 += STEP) {
-                const Word16 ps1 = add(ps0, dn[i3]);
-                Word32 alp1 = l_mac(alp0, rr[i3][i3], Q15_SIXTEENTH);
-                alp1 = l_mac(alp1, rr[i2][i3], Q15_EIGHTH);
-                alp1 = l_mac(alp1, rr[i1][i3], Q15_EIGHTH);
-                alp1 = l_mac(alp1, rr[i0][i3], Q15_EIGHTH);
-                const Word16 sq1 = mult(ps1, ps1);
-                const Word16 alp_16 = round16(alp1);
-                if (better(sq1, alp_16, sq, alp)) {
-                    sq = sq1;
-                    ps = ps1;
-                    alp = alp_16;
-                    ix = i3;
+            ps0 = best.ps;
+            alp0 = l_deposit_h(best.alp);
+            if (std::abs(int64_t{alp0}) <= ROOM4) {
+                for (int j = 0; j < N_POS; ++j) e[j] = t3.diag[j];
+                add_row(e, rr, i2, ipos[3], Q15_EIGHTH);
+                add_row(e, rr, i1, ipos[3], Q15_EIGHTH);
+                add_row(e, rr, i0, ipos[3], Q15_EIGHTH);
+                best = search_best{};
+                pick_best<N_POS>(ps0, alp0, t3.dn, e, t3.dn_max, 0, best);
+                i3 = ipos[3] + STEP * best.idx;
+            } else {
+                best = search_best{};
+                i3 = ipos[3];
+                for (int k = ipos[3]; k < L_CODE; k += STEP) {
+                    const Word16 ps1 = add(ps0, dn[k]);
+                    Word32 alp1 = l_mac(alp0, rr[k][k], Q15_SIXTEENTH);
+                    alp1 = l_mac(alp1, rr[i2][k], Q15_EIGHTH);
+                    alp1 = l_mac(alp1, rr[i1][k], Q15_EIGHTH);
+                    alp1 = l_mac(alp1, rr[i0][k], Q15_EIGHTH);
+                    const Word16 sq1 = mult(ps1, ps1);
+                    const Word16 alp_16 = round16(alp1);
+                    if (better(sq1, alp_16, best.sq, best.alp)) {
+                        best.sq = sq1;
+                        best.alp = alp_16;
+                        i3 = k;
+                    }
                 }
             }
         }
 
-        if (better(sq, alp, psk, alpk)) {
-            psk = sq;
-            alpk = alp;
+        if (better(best.sq, best.alp, psk, alpk)) {
+            psk = best.sq;
+            alpk = best.alp;
             codvec[0] = static_cast<Word16>(i0);
             codvec[1] = static_cast<Word16>(i1);
             codvec[2] = static_cast<Word16>(i2);
-            if (n_pulse == 4) codvec[3] = static_cast<Word16>(ix);
+            if (n_pulse == 4) codvec[3] = static_cast<Word16>(i3);
         }
     }
 }
@@ -179,6 +192,50 @@ void filter_pulses(const Word16 *h, const Word16 *codvec, const Word16 *signs, i
         Word32 s = 0;
         for (int k = 0; k < n; ++k) s = l_mac(s, hp[k][i], signs[k]);
         y[i] = round16(s);
+    }
+}
+
+void search_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *dn, const Word16 *dn2,
+                    const Word16 rr[L_CODE][L_CODE], Word16 *codvec) {
+    for (int k = 0; k < 4; ++k) codvec[k] = static_cast<Word16>(k);
+    Word16 psk = -1, alpk = 1;
+    if (mode == MR475 || mode == MR515) {
+        for (int t = 0; t < 2; ++t) {
+            search_pair(dn, rr, tab::startPos[subfr_nr * 2 + 8 * t],
+                        tab::startPos[subfr_nr * 2 + 1 + 8 * t], psk, alpk, codvec);
+        }
+        return;
+    }
+    if (mode == MR59) {
+        for (int t1 = 0; t1 < 2; ++t1) {
+            for (int t2 = 0; t2 < 4; ++t2) {
+                search_pair(dn, rr, tab::startPos1[t1], tab::startPos2[t2], psk, alpk, codvec);
+            }
+        }
+        return;
+    }
+    // Each start of the track order is searched with the order rotated
+    // through all pulses.
+    const auto rotations = [&](int n, int *ipos) {
+        for (int r = 0; r < n; ++r) {
+            search_multi(n, dn, dn2, rr, ipos, psk, alpk, codvec);
+            const int last = ipos[n - 1];
+            for (int q = n - 1; q > 0; --q) ipos[q] = ipos[q - 1];
+            ipos[0] = last;
+        }
+    };
+    if (mode == MR67) {
+        for (int t1 = 1; t1 < 4; t1 += 2) {
+            for (int t2 = 2; t2 < 5; t2 += 2) {
+                int ipos[3] = {0, t1, t2};
+                rotations(3, ipos);
+            }
+        }
+    } else {
+        for (int t = 3; t < 5; ++t) {
+            int ipos[4] = {0, 1, 2, t};
+            rotations(4, ipos);
+        }
     }
 }
 
@@ -204,45 +261,8 @@ Word16 code_lowrate(int32_t mode, int32_t subfr_nr, const Word16 *x, Word16 *h, 
     set_sign(dn, dn_sign, dn2, n_pulse == 2 ? 8 : (n_pulse == 3 ? 6 : 4));
     cor_h(h, dn_sign, rr);
 
-    Word16 codvec[4] = {0, 1, 2, 3};
-    Word16 psk = -1, alpk = 1;
-    if (mode == MR475 || mode == MR515) {
-        for (int t = 0; t < 2; ++t) {
-            search_pair(dn, rr, tab::startPos[subfr_nr * 2 + 8 * t],
-                        tab::startPos[subfr_nr * 2 + 1 + 8 * t], psk, alpk, codvec);
-        }
-    } else if (mode == MR59) {
-        for (int t1 = 0; t1 < 2; ++t1) {
-            for (int t2 = 0; t2 < 4; ++t2) {
-                search_pair(dn, rr, tab::startPos1[t1], tab::startPos2[t2], psk, alpk, codvec);
-            }
-        }
-    } else if (mode == MR67) {
-        for (int t1 = 1; t1 < 4; t1 += 2) {
-            for (int t2 = 2; t2 < 5; t2 += 2) {
-                int ipos[3] = {0, t1, t2};
-                for (int r = 0; r < 3; ++r) {
-                    search_multi(3, dn, dn2, rr, ipos, psk, alpk, codvec);
-                    const int last = ipos[2];
-                    ipos[2] = ipos[1];
-                    ipos[1] = ipos[0];
-                    ipos[0] = last;
-                }
-            }
-        }
-    } else {
-        for (int t = 3; t < 5; ++t) {
-            int ipos[4] = {0, 1, 2, t};
-            for (int r = 0; r < 4; ++r) {
-                search_multi(4, dn, dn2, rr, ipos, psk, alpk, codvec);
-                const int last = ipos[3];
-                ipos[3] = ipos[2];
-                ipos[2] = ipos[1];
-                ipos[1] = ipos[0];
-                ipos[0] = last;
-            }
-        }
-    }
+    Word16 codvec[4];
+    search_lowrate(mode, subfr_nr, dn, dn2, rr, codvec);
 
     // Code vector, signs and the position index.
     for (int i = 0; i < L_CODE; ++i) code[i] = 0;
