@@ -21,6 +21,7 @@
 
 #include "vamrnb.h"
 #include "vamrnb_rtp.h"
+#include "vamrnb_stream.h"
 #include "../support/amr_file.h"
 
 namespace fs = std::filesystem;
@@ -52,8 +53,7 @@ std::vector<int16_t> wav_samples(const fs::path &p) {
 }
 
 int frame_size(uint8_t toc) {
-    static const int size[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6, 1, 1, 1, 1};
-    return size[(toc >> 3) & 15];
+    return static_cast<int>(vamrnb_stream_frame_size((toc >> 3) & 15));
 }
 
 // The library's decoding of a storage file (magic included); the frames whose
@@ -189,6 +189,25 @@ protected:
         if (!have({__VA_ARGS__}))                                         \
             GTEST_SKIP() << missing << " is not installed (gstreamer1.0-plugins-base/good)"; \
     } while (0)
+
+TEST_F(GstTest, InspectListsCapsAndProperties) {
+    const struct { const char *element; std::vector<const char *> shown; } cases[] = {
+        {"vamrnbdec", {"audio/AMR", "S16LE", "S24LE", "S8", "channels: [ 1, 2 ]"}},
+        {"vamrnbenc", {"audio/AMR", "S16LE", "band-mode", "MR475", "dtx", "vad", "file-header",
+                       "send-no-data"}}};
+    for (const auto &c : cases) {
+        FILE *p = ::popen((std::string("gst-inspect-1.0 ") + c.element + " 2>&1").c_str(), "r");
+        ASSERT_NE(p, nullptr);
+        std::string text;
+        char chunk[4096];
+        for (size_t n; (n = std::fread(chunk, 1, sizeof chunk, p)) > 0;) text.append(chunk, n);
+        const int status = ::pclose(p);
+        if (WIFEXITED(status) && WEXITSTATUS(status) == 127)  // the shell found no program
+            GTEST_SKIP() << "gst-inspect-1.0 is not installed (gstreamer1.0-tools)";
+        for (const char *s : c.shown)
+            EXPECT_NE(text.find(s), std::string::npos) << c.element << " does not show " << s;
+    }
+}
 
 TEST_F(GstTest, AmrparseDecodingEqualsLibraryInEveryOutputFormat) {
     NEEDS("amrparse", "filesrc", "filesink");

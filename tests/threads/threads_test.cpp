@@ -17,12 +17,12 @@
 #include <vector>
 
 #include "vamrnb.h"
+#include "vamrnb_stream.h"
 
 namespace {
 
 constexpr int kThreads = 4;
 constexpr size_t kMaxFrames = 120;
-constexpr uint32_t kFrameBytes[16] = {13, 14, 16, 18, 20, 21, 27, 32, 6, 7, 6, 6, 1, 1, 1, 1};
 
 std::vector<uint8_t> read_file(const std::string &path) {
     std::ifstream f(path, std::ios::binary);
@@ -82,7 +82,7 @@ public:
         const int32_t st = vamrnbd_decode(dec_, &in, &pcm_, &info_);
         if (st != AMRNB_OK) {
             output.push_back(static_cast<uint8_t>(-st));
-            pos_ += kFrameBytes[(stream_[pos_] >> 3) & 15];
+            pos_ += vamrnb_stream_frame_size((stream_[pos_] >> 3) & 15);
             return true;
         }
         pos_ += info_.bytes;
