@@ -7,7 +7,7 @@ set -euo pipefail
 
 vamrnb_packages=(cmake g++ make pkg-config googletest libgtest-dev libbenchmark-dev
                  g++-arm-linux-gnueabihf qemu-user clang libsndfile1-dev libsoxr-dev
-                 python3)
+                 python3 g++-aarch64-linux-gnu valgrind)
 
 vamrnb_setup_deps() {
     if ! command -v dpkg-query >/dev/null 2>&1; then
