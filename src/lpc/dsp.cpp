@@ -33,11 +33,20 @@ constexpr DspKernels kAvx2Only = {
 };
 #endif
 
-#if defined(VAMRNB_DSP_NEON)
+#if defined(VAMRNB_DSP_NEON) && !defined(VAMRNB_DSP_A64)
 constexpr DspKernels kNeon = {
     syn_filt_neon, syn_filt_m_neon, residu_neon, pred_lt_3or6_neon, energy_neon,
     inner_product_neon, comp_corr_neon, convolve_neon,
     vq_subvec_neon, vq_subvec_s_neon, vq_subvec4_neon, cor_h_x_neon,
+};
+#endif
+
+#if defined(VAMRNB_DSP_A64)
+// 64-bit ARM: the NEON set with its A64 forms where they exist.
+constexpr DspKernels kNeonA64 = {
+    syn_filt_neon, syn_filt_m_neon, residu_a64, pred_lt_3or6_a64, energy_neon,
+    inner_product_a64, comp_corr_a64, convolve_a64,
+    vq_subvec_neon, vq_subvec_s_neon, vq_subvec4_neon, cor_h_x_a64,
 };
 #endif
 
@@ -51,7 +60,9 @@ const DspKernels *select(uint32_t flags) {
     if (sse41) return &kSse41;
     if (avx2) return &kAvx2Only;
 #endif
-#if defined(VAMRNB_DSP_NEON)
+#if defined(VAMRNB_DSP_A64)
+    if (flags & kCpuNeon) return &kNeonA64;
+#elif defined(VAMRNB_DSP_NEON)
     if (flags & kCpuNeon) return &kNeon;
 #endif
     (void)flags;
@@ -68,7 +79,7 @@ uint32_t cpu_detect() {
     if (__builtin_cpu_supports("avx2")) f |= kCpuAvx2;
 #endif
 #if defined(VAMRNB_DSP_NEON)
-    f |= kCpuNeon;   // the build itself requires NEON
+    f |= kCpuNeon;   // the build itself requires NEON (every AArch64 processor has it)
 #endif
     return f;
 }

@@ -1,6 +1,7 @@
 // Run-time selection of the subframe kernels.  Every kernel has a portable
 // scalar version (the definition of its result) and may have vector versions
-// for SSE4.1, AVX2 or NEON that produce identical bits.  A table of function
+// for SSE4.1, AVX2 or NEON (with A64 forms on 64-bit ARM) that produce
+// identical bits.  A table of function
 // pointers per feature set is chosen once from the processor's features,
 // restricted by the mask set with vamrnb_set_cpu_flags.
 #pragma once
@@ -105,6 +106,17 @@ int16_t vq_subvec_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 
 int16_t vq_subvec_s_neon(Word16 *r1, Word16 *r2, const Word16 *dico, const Word16 *w1,
                          const Word16 *w2, Word32 size);
 int16_t vq_subvec4_neon(Word16 *r, const Word16 *dico, const Word16 *w, Word32 size);
+
+// 64-bit ARM: versions that use A64-only instructions.
+#if defined(__aarch64__)
+#define VAMRNB_DSP_A64 1
+void residu_a64(const Word16 *a, const Word16 *x, Word16 *y);
+void pred_lt_3or6_a64(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc);
+Word32 inner_product_a64(const Word16 *x, const Word16 *y, Word32 n, Word32 init);
+void comp_corr_a64(const Word16 *x, Word32 len, Word32 lag_max, Word32 lag_min, Word32 *corr);
+void convolve_a64(const Word16 *x, const Word16 *h, Word16 *y);
+void cor_h_x_a64(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf);
+#endif
 #endif
 
 }  // namespace vamrnb
