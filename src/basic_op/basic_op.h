@@ -22,6 +22,17 @@
 #define VAMRNB_ARM_DSP 0
 #endif
 
+// 64-bit ARM has scalar forms of the saturating doubling multiplies: SQDMULL
+// is l_mult, SQDMLAL / SQDMLSL are l_mac / l_msu (saturated product, then
+// saturated sum), bit for bit.  A multiply-accumulate chain then keeps its
+// sum in one register with one instruction per step.
+#if defined(__aarch64__) && defined(__ARM_NEON)
+#include <arm_neon.h>
+#define VAMRNB_A64_SAT 1
+#else
+#define VAMRNB_A64_SAT 0
+#endif
+
 namespace vamrnb {
 
 using Word16 = int16_t;
@@ -117,6 +128,9 @@ constexpr Word16 extract_l(Word32 L) { return wrap16(L); }
 // ---- 32-bit operators ------------------------------------------------------
 
 constexpr Word32 l_mult(Word16 a, Word16 b) {
+#if VAMRNB_A64_SAT
+    if (!std::is_constant_evaluated()) return vqdmullh_s16(a, b);
+#endif
 #if VAMRNB_ARM_DSP
     if (!std::is_constant_evaluated()) return __qdbl(Word32{a} * b);
 #endif
@@ -141,8 +155,18 @@ constexpr Word32 l_sub(Word32 a, Word32 b) {
     if (__builtin_sub_overflow(a, b, &s)) return (a >> 31) ^ MAX_32;
     return s;
 }
-constexpr Word32 l_mac(Word32 acc, Word16 a, Word16 b) { return l_add(acc, l_mult(a, b)); }
-constexpr Word32 l_msu(Word32 acc, Word16 a, Word16 b) { return l_sub(acc, l_mult(a, b)); }
+constexpr Word32 l_mac(Word32 acc, Word16 a, Word16 b) {
+#if VAMRNB_A64_SAT
+    if (!std::is_constant_evaluated()) return vqdmlalh_s16(acc, a, b);
+#endif
+    return l_add(acc, l_mult(a, b));
+}
+constexpr Word32 l_msu(Word32 acc, Word16 a, Word16 b) {
+#if VAMRNB_A64_SAT
+    if (!std::is_constant_evaluated()) return vqdmlslh_s16(acc, a, b);
+#endif
+    return l_sub(acc, l_mult(a, b));
+}
 constexpr Word32 l_negate(Word32 L) { return L == MIN_32 ? MAX_32 : -L; }
 constexpr Word32 l_abs(Word32 L) { return L == MIN_32 ? MAX_32 : (L < 0 ? -L : L); }
 constexpr Word32 l_deposit_h(Word16 a) { return wrap_shl(a, 16); }
