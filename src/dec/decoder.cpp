@@ -27,8 +27,7 @@ dec_state *as_state(vamrnb_decoder *dec) { return reinterpret_cast<dec_state *>(
 // Initial values of the comfort-noise state.
 void reset_cn(dec_state *st) {
     dtx_dec_reset(&st->cn);
-    if (st->work != nullptr)
-        std::memcpy(st->work->cn_lsp_old, vamrnb_tbl_lsp_init_data, sizeof st->work->cn_lsp_old);
+    std::memcpy(st->work->cn_lsp_old, vamrnb_tbl_lsp_init_data, sizeof st->work->cn_lsp_old);
 }
 
 void reset_post(dec_state *st) {
@@ -180,7 +179,13 @@ extern "C" vamrnb_decoder *vamrnbd_create(const codec_config *config, int32_t *e
         return nullptr;
     }
     st->work = static_cast<dec_work *>(vcmn_malloc_align32(sizeof(dec_work)));
-    if (st->work != nullptr) std::memset(st->work, 0, sizeof *st->work);
+    if (st->work == nullptr) {
+        // Without its working record the instance could never decode a frame.
+        vcmn_mfree_align32(st);
+        if (error != nullptr) *error = AMRNB_ERR_NO_MEMORY;
+        return nullptr;
+    }
+    std::memset(st->work, 0, sizeof *st->work);
     std::memset(&st->cn, 0, sizeof st->cn);
     reset_dec(st, 0);
     if (error != nullptr) *error = AMRNB_OK;
@@ -210,7 +215,6 @@ extern "C" int32_t vamrnbd_decode(vamrnb_decoder *dec, const bitstream_buffer *i
     VAMRNB_REQUIRE(info);
     dec_state *st = as_state(dec);
     dec_work *w = st->work;
-    if (w == nullptr) return AMRNB_ERR_NO_MEMORY;
 
     vcmn_bsr_init(&st->reader, in->data, in->size, nullptr);
     int16_t serial[SERIAL_SIZE] = {};

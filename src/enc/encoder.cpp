@@ -63,7 +63,10 @@ extern "C" vamrnb_encoder *vamrnbe_create(const codec_config *config, int32_t *e
     }
     std::memset(static_cast<void *>(st), 0, sizeof(enc_state));
     st->config = *config;
-    if (st->config.enc.reserved != 0) {
+    // A mode outside MR475..MR122 has no frame layout to code into; refuse it
+    // here as vamrnbe_set_mode does rather than fail in the first frame.
+    const int32_t mode = st->config.enc.mode;
+    if (st->config.enc.reserved != 0 || mode < MR475 || mode > MR122) {
         vcmn_mfree_align32(st);
         if (error) *error = AMRNB_ERR_UNSUPPORTED;
         return nullptr;

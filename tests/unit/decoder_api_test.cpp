@@ -1,10 +1,13 @@
 // The decoder as a caller sees it, through the public header only: creation
-// and its status codes, refused output settings and frame types, bytes consumed, the frame counter, reset and
-// independence of instances.
+// and its status codes, refused output settings and frame types, bytes
+// consumed, truncated frames, every output setting end to end, the frame
+// counter, reset and independence of instances.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cstdint>
 #include <cstring>
+#include <iterator>
 #include <vector>
 
 #include "vamrnb.h"
@@ -96,19 +99,6 @@ TEST(DecoderApi, CreateChecksReservedWord) {
     vamrnbd_delete(nullptr);
 }
 
-TEST(DecoderApi, RefusedOutputSettings) {
-    uint32_t seed = 3;
-    const Frame fr = make_frame(7, seed);
-    for (const codec_config &c : {dec_config(1, 3, 0), dec_config(1, -1, 0), dec_config(1, 0, 1),
-                                  dec_config(1, 0, 3), dec_config(0, 1, 4), dec_config(1, 2, -1)}) {
-        Decoder d(c);
-        d.info.frame_count = 41;
-        EXPECT_EQ(d.decode(fr), AMRNB_ERR_UNSUPPORTED)
-            << c.dec.layout << ' ' << c.dec.channels << ' ' << c.dec.sample_format;
-        EXPECT_EQ(d.info.frame_count, 41u);
-    }
-}
-
 TEST(DecoderApi, RefusedFrameTypesLeaveNoTrace) {
     uint32_t seed = 99;
     const auto stream = mixed_stream(21, 40);
@@ -183,4 +173,119 @@ TEST(DecoderApi, ResetMatchesFreshInstanceAndInstancesAreIndependent) {
     }
     EXPECT_EQ(got_a, expect);
     EXPECT_EQ(got_b, expect_b);
+}
+
+TEST(DecoderApi, RefusedFrameTypeTouchesNoBuffer) {
+    Decoder d(config(1, 2, 3));
+    std::memset(d.buf, 0xAA, sizeof d.buf);
+    std::memset(d.pcm.samples, 0x5A, sizeof d.pcm.samples);
+    std::memset(d.pcm.bytes, 0x5A, sizeof d.pcm.bytes);
+    d.pcm.channels = d.pcm.bits_per_sample = d.pcm.reserved = d.pcm.layout = 0x5A5A5A5A;
+    const pcm_buffer before = d.pcm;
+    d.info = {9, 8, 7, {6}, 5};
+    uint32_t seed = 4;
+    for (int ft : {10, 11})
+        for (bool good : {true, false}) {
+            ASSERT_EQ(d.decode(make_frame(ft, seed, good)), AMRNB_ERR_BAD_FRAME_TYPE);
+            EXPECT_EQ(std::memcmp(&d.pcm, &before, sizeof before), 0) << ft;
+            for (const auto &b : d.buf)
+                for (uint8_t x : b) ASSERT_EQ(x, 0xAA) << ft;
+            EXPECT_EQ(d.info.produced, 0u);
+            EXPECT_TRUE(d.info.bytes == 8 && d.info.frame_count == 7 && d.info.channels == 6 &&
+                        d.info.bits_per_sample == 5);
+        }
+}
+
+TEST(DecoderApi, TruncatedFrameDecodesAsIfPaddedWithOnes) {
+    // Two decoders in step: one is given each frame cut short, the other the
+    // same bytes followed by 0xFF up to the frame's full size.
+    uint32_t seed = 12;
+    Decoder cut(config(1, 1, 0)), padded(config(1, 1, 0));
+    for (int ft : {7, 0, 5, 8, 8, 2}) {
+        const Frame f = make_frame(ft, seed);
+        for (uint32_t n = 0; n < f.size(); ++n) {
+            Frame g(f.begin(), f.begin() + n);
+            g.resize(n == 0 ? 1 : f.size(), 0xFF);
+            ASSERT_EQ(cut.decode(f.data(), n), AMRNB_OK);
+            ASSERT_EQ(padded.decode(g), AMRNB_OK);
+            ASSERT_EQ(cut.pcm16(), padded.pcm16()) << "frame type " << ft << ", " << n << " bytes";
+            EXPECT_LE(cut.info.bytes, n);
+        }
+    }
+}
+
+TEST(DecoderApi, EveryOutputSettingEndToEnd) {
+    uint32_t seed = 8;
+    const std::vector<Frame> frames = {make_frame(7, seed), make_frame(0, seed), make_frame(15, seed)};
+    Decoder ref(config(1, 1, 0));
+    const auto expect = decode_all(ref, frames);
+
+    constexpr uint32_t kMark = 0x5A5A5A5A;
+    for (int32_t layout : {1, 0, 2})
+        for (int32_t channels = -1; channels <= 3; ++channels)
+            for (int32_t format = -1; format <= 4; ++format) {
+                SCOPED_TRACE(testing::Message() << "layout " << layout << " channels " << channels << " format "
+                                                << format);
+                Decoder d(config(layout, channels, format));
+                const bool refused = format < 0 || format > 3 || channels < 0 || channels > 2 ||
+                                     (channels == 0 && format != 0);
+                const int nch = channels == 2 ? 2 : 1;
+                const int bps = format == 1 ? 8 : format == 3 ? 24 : 16;
+                for (size_t k = 0; k < frames.size(); ++k) {
+                    std::memset(d.buf, 0xAA, sizeof d.buf);
+                    pcm_buffer &p = d.pcm;
+                    std::fill(std::begin(p.samples), std::end(p.samples), kMark);
+                    std::fill(std::begin(p.bytes), std::end(p.bytes), kMark);
+                    p.channels = p.bits_per_sample = p.reserved = p.layout = kMark;
+                    const int32_t st = d.decode(frames[k]);
+                    if (refused) {
+                        ASSERT_EQ(st, AMRNB_ERR_UNSUPPORTED);
+                        EXPECT_EQ(d.info.frame_count, 0u);
+                        for (const auto &b : d.buf)
+                            for (uint8_t x : b) ASSERT_EQ(x, 0xAA);
+                        continue;
+                    }
+                    ASSERT_EQ(st, AMRNB_OK);
+                    EXPECT_TRUE(d.info.channels == uint32_t(nch) && d.info.bits_per_sample == uint32_t(bps));
+                    EXPECT_TRUE(p.channels == uint32_t(nch) && p.bits_per_sample == uint32_t(bps));
+                    EXPECT_EQ(p.layout, uint32_t(layout));
+                    EXPECT_EQ(p.reserved, kMark);
+
+                    // The bytes each channel should carry.
+                    std::vector<uint8_t> one;
+                    for (int16_t s : expect[k]) {
+                        if (format == 1) {
+                            one.push_back(uint8_t(std::clamp((s + 128) >> 8, -128, 127)));
+                        } else {
+                            if (format == 3) one.push_back(0);
+                            one.push_back(uint8_t(s & 0xFF));
+                            one.push_back(uint8_t((s >> 8) & 0xFF));
+                        }
+                    }
+                    const size_t w = bps / 8;
+                    for (size_t i = 0; i < 8; ++i) {
+                        const bool used = layout == 1 ? i == 0 : i == 1 || i == 2;
+                        EXPECT_TRUE(used || (p.samples[i] == kMark && p.bytes[i] == kMark)) << i;
+                    }
+                    if (layout == 1) {
+                        EXPECT_TRUE(p.samples[0] == 160u * nch && p.bytes[0] == 160u * nch * w);
+                        for (size_t i = 0; i < 160; ++i)
+                            for (int ch = 0; ch < nch; ++ch)
+                                ASSERT_EQ(std::memcmp(d.buf[0] + (i * nch + ch) * w, &one[i * w], w), 0) << i;
+                        EXPECT_EQ(d.buf[0][160 * nch * w], 0xAA);
+                        EXPECT_TRUE(d.buf[1][0] == 0xAA && d.buf[2][0] == 0xAA);
+                    } else {
+                        EXPECT_TRUE(p.samples[1] == 160u && p.samples[2] == 160u);
+                        EXPECT_TRUE(p.bytes[1] == 160u * w && p.bytes[2] == 160u * w);
+                        for (int ch = 0; ch < nch; ++ch) {
+                            ASSERT_EQ(std::memcmp(d.buf[1 + ch], one.data(), one.size()), 0) << ch;
+                            EXPECT_EQ(d.buf[1 + ch][one.size()], 0xAA);
+                        }
+                        EXPECT_EQ(d.buf[0][0], 0xAA);
+                        if (nch == 1) {
+                            EXPECT_EQ(d.buf[2][0], 0xAA);
+                        }
+                    }
+                }
+            }
 }

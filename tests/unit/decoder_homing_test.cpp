@@ -105,4 +105,35 @@ TEST(DecoderHoming, LostFrameWhileHomedIsDecoded) {
     EXPECT_TRUE(is_homing_answer(a.run(homing(MR475))));
 }
 
+TEST(DecoderHoming, ResetKeepsTheHomingHistory) {
+    // A reset restores the signal state, not whether the last frame homed:
+    // a decoder that had left the homed state decodes the next homing frame
+    // as speech, and one still homed answers it.
+    std::mt19937 rng(5);
+    Decoder left;
+    left.run(random_speech(MR475, rng));
+    vamrnbd_reset(left.d);
+    EXPECT_FALSE(is_homing_answer(left.run(homing(MR475))));
+    EXPECT_TRUE(is_homing_answer(left.run(homing(MR475))));  // that frame homed it
+
+    Decoder homed;
+    EXPECT_TRUE(is_homing_answer(homed.run(homing(MR122))));
+    vamrnbd_reset(homed.d);
+    EXPECT_TRUE(is_homing_answer(homed.run(homing(MR122))));
+}
+
+TEST(DecoderHoming, QualityBitDoesNotMatter) {
+    // The homing pattern is recognised in a frame marked bad as well.
+    Frame bad = homing(MR795);
+    bad[0] &= static_cast<uint8_t>(~4);
+    Decoder homed;
+    EXPECT_TRUE(is_homing_answer(homed.run(bad)));
+
+    std::mt19937 rng(6);
+    Decoder running;
+    running.run(random_speech(MR795, rng));
+    EXPECT_FALSE(is_homing_answer(running.run(bad)));
+    EXPECT_TRUE(is_homing_answer(running.run(homing(MR795))));  // the bad one reset it
+}
+
 }  // namespace

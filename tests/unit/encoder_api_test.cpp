@@ -1,7 +1,9 @@
 // Encoder instance and frame driver through the public interface.
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <cmath>
+#include <memory>
 #include <cstring>
 #include <vector>
 
@@ -54,7 +56,7 @@ struct Encoder {
 
 }  // namespace
 
-TEST(EncApi, CreateRejectsReservedWordWithoutLeaking) {
+TEST(EncApi, CreateRefusesReservedWordAndModesOutsideRange) {
     codec_config c = config(0, MR122);
     c.enc.reserved = 5;
     int32_t err = 0;
@@ -62,6 +64,17 @@ TEST(EncApi, CreateRejectsReservedWordWithoutLeaking) {
     EXPECT_EQ(err, AMRNB_ERR_UNSUPPORTED);
     // The error pointer is optional.
     EXPECT_EQ(vamrnbe_create(&c, nullptr), nullptr);
+
+    // A mode with no frame layout is refused at creation, as by
+    // vamrnbe_set_mode, with DTX on or off.
+    for (int32_t mode : {-1, 8, 9, 15, 16, INT32_MIN, INT32_MAX}) {
+        for (int32_t dtx : {0, 1}) {
+            err = 0;
+            c = config(dtx, mode);
+            EXPECT_EQ(vamrnbe_create(&c, &err), nullptr) << mode;
+            EXPECT_EQ(err, AMRNB_ERR_UNSUPPORTED) << mode;
+        }
+    }
 
     codec_config ok = config(0, MR122);
     vamrnb_encoder *enc = vamrnbe_create(&ok, nullptr);
@@ -95,19 +108,61 @@ TEST(EncApi, InputIsMaskedInPlace) {
     for (int i = 0; i < 160; ++i) EXPECT_EQ(e.pcm[i], static_cast<int16_t>(before[i] & ~7)) << i;
 }
 
-TEST(EncApi, SmallOutputBufferGivesShortFrameWithoutOverrun) {
-    Encoder e(config(0, MR122));
-    speech_like(e.pcm, 0);
-    e.bs.size = 5;
-    const frame_info info = e.encode();
-    EXPECT_LE(info.bytes, 5u);
-    EXPECT_EQ(e.out[0], 0x3C);
-    for (size_t i = 5; i < e.out.size(); ++i) EXPECT_EQ(e.out[i], 0xAA) << i;
+// Speech for ten frames, then silence: with DTX on this gives SID_FIRST,
+// NO_DATA and SID_UPDATE frames after the hangover.
+void talk_then_silence(std::vector<int16_t> &pcm, int frame) {
+    if (frame < 10)
+        speech_like(pcm, frame);
+    else
+        std::fill(pcm.begin(), pcm.end(), 0);
+}
 
-    // The instance keeps working with a proper buffer afterwards.
-    e.bs.size = 32;
-    speech_like(e.pcm, 1);
-    EXPECT_EQ(e.encode().bytes, 32u);
+TEST(EncApi, SmallOutputBufferTakesWhatFits) {
+    // One encoder per room size, all fed the same input: each frame's bytes
+    // are the first min(room, frame size) bytes of the whole frame, and
+    // nothing is written past the room.
+    Encoder whole(config(1, MR74));
+    std::vector<std::unique_ptr<Encoder>> small;
+    for (uint32_t room = 0; room <= 40; ++room) {
+        small.push_back(std::make_unique<Encoder>(config(1, MR74)));
+        small.back()->bs.size = room;
+    }
+    bool sid = false, nodata = false;
+    for (int f = 0; f < 30; ++f) {
+        talk_then_silence(whole.pcm, f);
+        const frame_info info = whole.encode();
+        sid |= info.frame_type == 8;
+        nodata |= info.frame_type == 15;
+        for (uint32_t room = 0; room <= 40; ++room) {
+            Encoder &e = *small[room];
+            talk_then_silence(e.pcm, f);
+            std::fill(e.out.begin(), e.out.end(), 0xAA);
+            const frame_info got = e.encode();
+            const uint32_t n = std::min(room, info.bytes);
+            ASSERT_EQ(got.bytes, n) << "room " << room << ", frame " << f;
+            ASSERT_EQ(got.frame_type, info.frame_type);
+            ASSERT_TRUE(std::equal(e.out.begin(), e.out.begin() + n, whole.out.begin())) << room;
+            ASSERT_TRUE(std::all_of(e.out.begin() + room, e.out.end(), [](uint8_t b) { return b == 0xAA; }));
+        }
+    }
+    EXPECT_TRUE(sid && nodata) << "the stream must reach SID and no-data frames";
+}
+
+TEST(EncApi, DtxWordsOtherThanOneSwitchDtxOff) {
+    auto encode_stream = [](codec_config c) {
+        Encoder e(c);
+        std::vector<uint8_t> bytes;
+        for (int f = 0; f < 30; ++f) {
+            talk_then_silence(e.pcm, f);
+            const frame_info info = e.encode();
+            bytes.insert(bytes.end(), e.out.begin(), e.out.begin() + info.bytes);
+        }
+        return bytes;
+    };
+    const auto off = encode_stream(config(0, MR59));
+    EXPECT_NE(encode_stream(config(1, MR59)), off);
+    for (int32_t dtx : {2, -1, INT32_MIN, INT32_MAX})
+        for (int32_t vad : {0, 1}) EXPECT_EQ(encode_stream(config(dtx, MR59, vad)), off) << dtx << ' ' << vad;
 }
 
 TEST(EncApi, SetModeValidatesAndAppliesFromNextFrame) {
