@@ -11,7 +11,8 @@
  *   -p PT   RTP payload type (default 97)
  *
  * `send` writes one IPv4/UDP/RTP packet (port 5004 to 5004) per N frames of
- * the file, RTP timestamp in 8 kHz samples.  `receive` keeps the UDP packets
+ * the file (read with the library's stream reader), RTP timestamp in 8 kHz
+ * samples.  `receive` keeps the UDP packets
  * to port 5004 with the payload type, parses their payloads and writes the
  * frames back as an .amr file, with NO_DATA frames where packets are missing
  * (packets of NO_DATA frames alone are not sent).
@@ -23,11 +24,9 @@
 #include <string.h>
 
 #include "vamrnb_rtp.h"
-#include "vamrnb_tables.h"
+#include "vamrnb_stream.h"
 
 enum { PORT = 5004, SSRC = 0x5AFE0A3B, MAX_PER_PACKET = 12, SNAP = 65535 };
-
-static const char magic[6] = {'#', '!', 'A', 'M', 'R', '\n'};
 
 typedef struct options {
     vamrnb_rtp_params params;
@@ -60,13 +59,6 @@ static uint8_t *read_file(const char *path, size_t *size) {
     if (bad) { free(buf); return NULL; }
     *size = n;
     return buf;
-}
-
-/* Bytes of the stored frame that starts with `toc`: the reserved types are
- * the byte alone. */
-static size_t frame_size(uint8_t toc) {
-    int n = vamrnb_tbl_packed_size[(toc >> 3) & 15];
-    return n > 0 ? (size_t)n : 1;
 }
 
 static int write_packet(FILE *out, const uint8_t *payload, size_t size, int pt, unsigned seq,
@@ -107,43 +99,72 @@ static int write_packet(FILE *out, const uint8_t *payload, size_t size, int pt, 
     return fwrite(rec, 1, 16, out) == 16 && fwrite(pkt, 1, len, out) == len ? 0 : -1;
 }
 
-static int send_file(const options *o, const char *in_path, FILE *out) {
-    size_t size = 0;
-    uint8_t *in = read_file(in_path, &size);
-    if (!in) { fprintf(stderr, "%s: %s\n", in_path, strerror(errno)); return -1; }
-    if (size < 6 || memcmp(in, magic, 6) != 0) {
-        fprintf(stderr, "%s: not a single-channel .amr file\n", in_path);
-        free(in);
-        return -1;
+/* The .amr input, read in pieces through the library's stream reader. */
+typedef struct source {
+    FILE *file;
+    const char *path;
+    vamrnb_stream_reader *reader;
+    uint8_t buf[4096];
+    size_t pos, len;
+} source;
+
+/* The next stored frame into *f: 1, or 0 at a clean end, or -1 (reported). */
+static int next_frame(source *s, vamrnb_stream_frame *f) {
+    int32_t st = AMRNB_OK;
+    for (;;) {
+        if (s->pos < s->len) {
+            size_t used = 0;
+            st = vamrnb_stream_read(s->reader, s->buf + s->pos, s->len - s->pos, &used, f);
+            s->pos += used;
+            if (st == VAMRNB_STREAM_FRAME) return 1;
+            if (st != AMRNB_OK) break;
+            continue;
+        }
+        s->pos = 0;
+        s->len = fread(s->buf, 1, sizeof s->buf, s->file);
+        if (s->len == 0) {
+            if (ferror(s->file)) { fprintf(stderr, "%s: %s\n", s->path, strerror(errno)); return -1; }
+            st = vamrnb_stream_finish(s->reader, NULL);
+            if (st == AMRNB_OK) return 0;
+            break;
+        }
     }
+    if (st == VAMRNB_STREAM_ERR_TOC)
+        fprintf(stderr, "%s: %s (byte %llu)\n", s->path, vamrnb_strerror(st),
+                (unsigned long long)vamrnb_stream_reader_offset(s->reader));
+    else
+        fprintf(stderr, "%s: %s\n", s->path, vamrnb_strerror(st));
+    return -1;
+}
+
+static int send_stream(const options *o, source *src, FILE *out) {
     uint8_t head[24];
     put32le(head, 0xA1B2C3D4);
     head[4] = 2; head[5] = 0; head[6] = 4; head[7] = 0;   /* version 2.4 */
     memset(head + 8, 0, 8);
     put32le(head + 16, SNAP);
     put32le(head + 20, 1);                                 /* Ethernet */
-    int rc = fwrite(head, 1, 24, out) == 24 ? 0 : -1;
+    if (fwrite(head, 1, 24, out) != 24) return -1;
 
     unsigned seq = 0;
     uint32_t ts = 0;
-    for (size_t pos = 6; rc == 0 && pos < size;) {
+    vamrnb_stream_frame f;
+    int more = next_frame(src, &f);
+    while (more > 0) {
         /* The next N frames; the reserved types cannot be sent and go as NO_DATA. */
-        uint8_t frames[MAX_PER_PACKET * 32];
+        uint8_t frames[MAX_PER_PACKET * VAMRNB_STREAM_MAX_FRAME];
         size_t used = 0;
         int n = 0;
-        for (; n < o->per_packet && pos < size; ++n) {
-            size_t len = frame_size(in[pos]);
-            const int ft = (in[pos] >> 3) & 15;
-            if (len > size - pos) { fprintf(stderr, "%s: last frame cut short\n", in_path); rc = -1; break; }
-            if (ft >= 12 && ft <= 14) frames[used++] = 0x7C;
-            else { memcpy(frames + used, in + pos, len); used += len; }
-            pos += len;
+        for (; n < o->per_packet && more > 0; ++n) {
+            if (f.type >= 12 && f.type <= 14) frames[used++] = 0x7C;
+            else { memcpy(frames + used, f.data, f.size); used += f.size; }
+            more = next_frame(src, &f);
         }
-        if (rc || n == 0) break;
+        if (more < 0) return -1;
         /* A packet of nothing but NO_DATA frames (all one byte) is not sent;
          * the receiver sees the timestamps skip.  The last one always goes,
          * so that the stream keeps its length. */
-        if (used == (size_t)n && pos < size) {
+        if (used == (size_t)n && more > 0) {
             ts += 160u * (uint32_t)n;
             continue;
         }
@@ -151,12 +172,24 @@ static int send_file(const options *o, const char *in_path, FILE *out) {
         vamrnb_rtp_info info;
         int32_t st = vamrnb_rtp_pack(&o->params, VAMRNB_RTP_CMR_NONE, frames, used, payload,
                                      sizeof payload, &info);
-        if (st != AMRNB_OK) { fprintf(stderr, "packing failed: %d\n", (int)st); rc = -1; break; }
-        rc = write_packet(out, payload, info.bytes, o->pt, seq, ts, seq == 0);
+        if (st != AMRNB_OK) { fprintf(stderr, "packing failed: %s\n", vamrnb_strerror(st)); return -1; }
+        if (write_packet(out, payload, info.bytes, o->pt, seq, ts, seq == 0) != 0) return -1;
         ++seq;
         ts += 160u * info.frames;
     }
-    free(in);
+    return more;
+}
+
+static int send_file(const options *o, const char *in_path, FILE *out) {
+    source src = {.file = fopen(in_path, "rb"), .path = in_path};
+    if (!src.file) { fprintf(stderr, "%s: %s\n", in_path, strerror(errno)); return -1; }
+    int32_t error = AMRNB_OK;
+    src.reader = vamrnb_stream_reader_create(&error);
+    int rc = -1;
+    if (!src.reader) fprintf(stderr, "stream reader: %s\n", vamrnb_strerror(error));
+    else rc = send_stream(o, &src, out);
+    vamrnb_stream_reader_delete(src.reader);
+    fclose(src.file);
     return rc;
 }
 
@@ -169,7 +202,7 @@ static int receive_file(const options *o, const char *in_path, FILE *out) {
         free(in);
         return -1;
     }
-    int rc = fwrite(magic, 1, 6, out) == 6 ? 0 : -1;
+    int rc = fputs(VAMRNB_STREAM_MAGIC, out) == EOF ? -1 : 0;
     int have_ts = 0;
     uint32_t next_ts = 0;
     for (size_t pos = 24; rc == 0 && pos + 16 <= size;) {

@@ -1,6 +1,7 @@
 // The GStreamer elements in real pipelines, each result compared byte for byte
 // with the library's own encoding or decoding of the same input: amrparse,
-// 3GP through qtdemux, RTP with and without lost packets, lost frames in every
+// 3GP through qtdemux, RTP with and without lost packets, the library's
+// octet-aligned RTP payloads through the stock depayloader, lost frames in every
 // form upstream reports them, the encoder in every mode, a mode change while
 // playing, the padded last frame, and an arbitrary source through decodebin.
 #include <gst/gst.h>
@@ -20,6 +21,7 @@
 #include <vector>
 
 #include "vamrnb.h"
+#include "vamrnb_rtp.h"
 
 namespace fs = std::filesystem;
 using Bytes = std::vector<uint8_t>;
@@ -162,9 +164,9 @@ protected:
 
     // Runs a gst-launch style pipeline to its end; probes attach to the named
     // element's pad ("name.sink" or "name.src") before it starts, and an
-    // appsrc named "src" is handed `feed` as one buffer.
+    // appsrc named "src" is handed the buffers of `feed` with their times.
     void run(const std::string &desc, const std::vector<std::pair<std::string, Probe>> &at = {},
-             const Bytes &feed = {}) {
+             const std::vector<std::pair<GstClockTime, Bytes>> &feed = {}) {
         GError *error = nullptr;
         GstElement *pipe = gst_parse_launch(desc.c_str(), &error);
         ASSERT_TRUE(pipe && !error) << desc << ": " << (error ? error->message : "");
@@ -184,12 +186,14 @@ protected:
             gst_object_unref(el);
         }
         if (GstElement *src = gst_bin_get_by_name(GST_BIN(pipe), "src")) {
-            GstBuffer *buf = gst_buffer_new_memdup(feed.data(), feed.size());
-            GST_BUFFER_PTS(buf) = 0;
             GstFlowReturn ret;
-            g_signal_emit_by_name(src, "push-buffer", buf, &ret);
+            for (const auto &[pts, bytes] : feed) {
+                GstBuffer *buf = gst_buffer_new_memdup(bytes.data(), bytes.size());
+                GST_BUFFER_PTS(buf) = pts;
+                g_signal_emit_by_name(src, "push-buffer", buf, &ret);
+                gst_buffer_unref(buf);
+            }
             g_signal_emit_by_name(src, "end-of-stream", &ret);
-            gst_buffer_unref(buf);
             gst_object_unref(src);
         }
         gst_element_set_state(pipe, GST_STATE_PLAYING);
@@ -274,7 +278,7 @@ TEST_F(GstTest, WholeFileInOneBufferIncludingRefusedFrameTypes) {
                              "dtx_it-IT_m_carlo_talkspurts_noise-bed/vad1_MR795_ft9-14.amr"}) {
         const Bytes file = read_bytes(kSource / "tests/data/vectors/err" / name);
         run("appsrc name=src format=time caps=audio/AMR,rate=8000,channels=1 ! vamrnbdec ! "
-            "filesink location=" + path("out.pcm"), {}, Bytes(file.begin() + kMagicSize, file.end()));
+            "filesink location=" + path("out.pcm"), {}, {{0, Bytes(file.begin() + kMagicSize, file.end())}});
         EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(file)) << name;
     }
 }
@@ -355,6 +359,52 @@ TEST_F(GstTest, RtpRoundTripWithAndWithoutLostPackets) {
         "vamrnbdec ! filesink location=" + path("out.pcm"));
     const size_t whole = (pcm.size() + 159) / 160 * 320;
     EXPECT_NEAR(double(read_bytes(path("out.pcm")).size()), double(whole), 20 * 320.0);
+}
+
+TEST_F(GstTest, LibraryOctetAlignedPacketsThroughRtpamrdepayDecodeLikeTheFrames) {
+    NEEDS("appsrc", "rtpamrdepay", "filesink");
+    // A mode change every half second with DTX, so that every speech mode,
+    // SID and NO_DATA entries travel; packed by the library, 1, 3 and 10
+    // frames a packet.  (Frame CRCs are left out: with crc=1 the stock
+    // depayloader hands each frame on with its CRC byte still inside.)
+    const Bytes file =
+        lib_encode(wav_samples(kDemo), [](size_t f) { return int(f / 25 % 8); }, true, 1);
+    std::set<int> types;
+    for (size_t pos = kMagicSize; pos < file.size(); pos += size_t(frame_size(file[pos])))
+        types.insert((file[pos] >> 3) & 15);
+    ASSERT_EQ(types, (std::set<int>{0, 1, 2, 3, 4, 5, 6, 7, 8, 15}));
+    vamrnb_rtp_params params;
+    vamrnb_rtp_params_default(&params);
+    params.octet_align = 1;
+    for (const unsigned per_packet : {1u, 3u, 10u}) {
+        std::vector<std::pair<GstClockTime, Bytes>> packets;
+        uint32_t ts = 0;
+        for (size_t pos = kMagicSize; pos < file.size();) {
+            size_t end = pos;
+            for (unsigned n = 0; n < per_packet && end < file.size(); ++n)
+                end += static_cast<size_t>(frame_size(file[end]));
+            Bytes pkt(12 + 1500);
+            const uint16_t seq = static_cast<uint16_t>(packets.size());
+            const uint8_t head[12] = {0x80, uint8_t((packets.empty() ? 0x80 : 0) | 97),
+                                      uint8_t(seq >> 8), uint8_t(seq), uint8_t(ts >> 24),
+                                      uint8_t(ts >> 16), uint8_t(ts >> 8), uint8_t(ts),
+                                      0x5A, 0xFE, 0x0A, 0x3B};
+            std::memcpy(pkt.data(), head, 12);
+            vamrnb_rtp_info info{};
+            ASSERT_EQ(vamrnb_rtp_pack(&params, VAMRNB_RTP_CMR_NONE, &file[pos], end - pos,
+                                      &pkt[12], pkt.size() - 12, &info),
+                      AMRNB_OK);
+            pkt.resize(12 + info.bytes);
+            packets.emplace_back(GstClockTime(ts) * GST_SECOND / 8000, std::move(pkt));
+            ts += 160 * info.frames;
+            pos = end;
+        }
+        run("appsrc name=src format=time caps=application/x-rtp,media=audio,clock-rate=8000,"
+            "encoding-name=AMR,encoding-params=1,payload=97,octet-align=(string)1 ! "
+            "rtpamrdepay ! vamrnbdec ! filesink location=" + path("out.pcm"),
+            {}, packets);
+        EXPECT_EQ(read_bytes(path("out.pcm")), lib_decode(file)) << per_packet << " frames a packet";
+    }
 }
 
 TEST_F(GstTest, EncoderEqualsLibraryInEveryModeWithAndWithoutDtx) {

@@ -176,7 +176,7 @@ TEST(DecoderApi, ResetMatchesFreshInstanceAndInstancesAreIndependent) {
 }
 
 TEST(DecoderApi, RefusedFrameTypeTouchesNoBuffer) {
-    Decoder d(config(1, 2, 3));
+    Decoder d(dec_config(1, 2, 3));
     std::memset(d.buf, 0xAA, sizeof d.buf);
     std::memset(d.pcm.samples, 0x5A, sizeof d.pcm.samples);
     std::memset(d.pcm.bytes, 0x5A, sizeof d.pcm.bytes);
@@ -200,7 +200,7 @@ TEST(DecoderApi, TruncatedFrameDecodesAsIfPaddedWithOnes) {
     // Two decoders in step: one is given each frame cut short, the other the
     // same bytes followed by 0xFF up to the frame's full size.
     uint32_t seed = 12;
-    Decoder cut(config(1, 1, 0)), padded(config(1, 1, 0));
+    Decoder cut(dec_config(1, 1, 0)), padded(dec_config(1, 1, 0));
     for (int ft : {7, 0, 5, 8, 8, 2}) {
         const Frame f = make_frame(ft, seed);
         for (uint32_t n = 0; n < f.size(); ++n) {
@@ -217,7 +217,7 @@ TEST(DecoderApi, TruncatedFrameDecodesAsIfPaddedWithOnes) {
 TEST(DecoderApi, EveryOutputSettingEndToEnd) {
     uint32_t seed = 8;
     const std::vector<Frame> frames = {make_frame(7, seed), make_frame(0, seed), make_frame(15, seed)};
-    Decoder ref(config(1, 1, 0));
+    Decoder ref(dec_config(1, 1, 0));
     const auto expect = decode_all(ref, frames);
 
     constexpr uint32_t kMark = 0x5A5A5A5A;
@@ -226,7 +226,7 @@ TEST(DecoderApi, EveryOutputSettingEndToEnd) {
             for (int32_t format = -1; format <= 4; ++format) {
                 SCOPED_TRACE(testing::Message() << "layout " << layout << " channels " << channels << " format "
                                                 << format);
-                Decoder d(config(layout, channels, format));
+                Decoder d(dec_config(layout, channels, format));
                 const bool refused = format < 0 || format > 3 || channels < 0 || channels > 2 ||
                                      (channels == 0 && format != 0);
                 const int nch = channels == 2 ? 2 : 1;

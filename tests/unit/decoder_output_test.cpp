@@ -22,8 +22,6 @@ struct Out {
     }
 };
 
-}
-
 TEST(DecoderOutput, EightBitSamplesRoundDownAndSaturate) {
     Out o;
     std::vector<int16_t> s(160, 0);
