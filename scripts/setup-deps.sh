@@ -7,7 +7,7 @@ set -euo pipefail
 
 vamrnb_packages=(cmake g++ make pkg-config googletest libgtest-dev libbenchmark-dev
                  g++-arm-linux-gnueabihf qemu-user clang libsndfile1-dev libsoxr-dev
-                 python3 help2man doxygen abigail-tools
+                 python3 g++-aarch64-linux-gnu valgrind help2man doxygen abigail-tools
                  tshark
                  libgstreamer1.0-dev libgstreamer-plugins-base1.0-dev gstreamer1.0-tools
                  gstreamer1.0-plugins-base gstreamer1.0-plugins-good

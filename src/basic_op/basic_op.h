@@ -129,7 +129,7 @@ constexpr Word16 extract_l(Word32 L) { return wrap16(L); }
 
 constexpr Word32 l_mult(Word16 a, Word16 b VAMRNB_SITE) {
     VAMRNB_SATURATED(a == MIN_16 && b == MIN_16, "l_mult");
-#if VAMRNB_ARCH_OPS
+#if VAMRNB_ARCH_OPS || VAMRNB_ARCH_MAC
     if (!std::is_constant_evaluated()) return arch::l_mult(a, b);
 #endif
     const Word32 p = Word32{a} * b;
@@ -158,9 +158,15 @@ constexpr Word32 l_sub(Word32 a, Word32 b VAMRNB_SITE) {
     return rail32(a, s, over, "l_sub" VAMRNB_SITE_ARG);
 }
 constexpr Word32 l_mac(Word32 acc, Word16 a, Word16 b VAMRNB_SITE) {
+#if VAMRNB_ARCH_MAC
+    if (!std::is_constant_evaluated()) return arch::l_mac(acc, a, b);
+#endif
     return l_add(acc, l_mult(a, b VAMRNB_SITE_ARG) VAMRNB_SITE_ARG);
 }
 constexpr Word32 l_msu(Word32 acc, Word16 a, Word16 b VAMRNB_SITE) {
+#if VAMRNB_ARCH_MAC
+    if (!std::is_constant_evaluated()) return arch::l_msu(acc, a, b);
+#endif
     return l_sub(acc, l_mult(a, b VAMRNB_SITE_ARG) VAMRNB_SITE_ARG);
 }
 constexpr Word32 l_negate(Word32 L VAMRNB_SITE) {

@@ -41,17 +41,13 @@ inline Word32 dot_sat(const Word16 *x, const Word16 *y, int n) {
 // ---- dot products with any summation order --------------------------------
 // inner_product's running sum saturates nowhere when |init| plus the sum of
 // all |terms| fits in 32 bits; then it is the exact sum.  A vector version
-// forms the exact sum of the first n8 samples in its lanes (`sums`) and the
-// lane maxima of |x| and |y| (`ax`, `ay`); this completes the tail and the
-// bound, and hands inputs that fail it to the sequential portable version.
+// forms the exact sum of the first n8 samples (`lanes`) and the largest
+// magnitudes of x and y among them (`max_x`, `max_y`); this completes the
+// tail and the bound, and hands inputs that fail it to the sequential
+// portable version.
 inline Word32 inner_product_finish(const Word16 *x, const Word16 *y, Word32 n, Word32 n8, Word32 init,
-                                   const uint16_t ax[8], const uint16_t ay[8], const int32_t sums[4],
+                                   int64_t lanes, int64_t max_x, int64_t max_y,
                                    Word32 (*sequential)(const Word16 *, const Word16 *, Word32, Word32)) {
-    int64_t max_x = 0, max_y = 0;
-    for (int k = 0; k < 8; ++k) {
-        max_x = ax[k] > max_x ? ax[k] : max_x;
-        max_y = ay[k] > max_y ? ay[k] : max_y;
-    }
     int64_t tail = 0;
     for (Word32 i = n8; i < n; ++i) {
         const int64_t px = x[i] < 0 ? -int64_t{x[i]} : x[i];
@@ -62,8 +58,20 @@ inline Word32 inner_product_finish(const Word16 *x, const Word16 *y, Word32 n, W
     }
     const int64_t abs_init = init < 0 ? -int64_t{init} : init;
     if (abs_init + 2 * int64_t{n} * max_x * max_y > MAX_32) return sequential(x, y, n, init);
-    const int64_t total = int64_t{sums[0]} + sums[1] + sums[2] + sums[3] + tail;
-    return static_cast<Word32>(init + 2 * total);
+    return static_cast<Word32>(init + 2 * (lanes + tail));
+}
+
+// The same from the lanes as stored: four partial sums, eight maxima each.
+inline Word32 inner_product_finish(const Word16 *x, const Word16 *y, Word32 n, Word32 n8, Word32 init,
+                                   const uint16_t ax[8], const uint16_t ay[8], const int32_t sums[4],
+                                   Word32 (*sequential)(const Word16 *, const Word16 *, Word32, Word32)) {
+    int64_t max_x = 0, max_y = 0;
+    for (int k = 0; k < 8; ++k) {
+        max_x = ax[k] > max_x ? ax[k] : max_x;
+        max_y = ay[k] > max_y ? ay[k] : max_y;
+    }
+    const int64_t lanes = int64_t{sums[0]} + sums[1] + sums[2] + sums[3];
+    return inner_product_finish(x, y, n, n8, init, lanes, max_x, max_y, sequential);
 }
 
 // Open-loop correlations: corr[-lag] for lag_max down to lag_min; exact_dot

@@ -43,7 +43,11 @@ constexpr Level kLevels[] = {
     {"c", 0, 0},
     {"sse4.1", vamrnb::kCpuSse41, 0},
     {"avx2", vamrnb::kCpuSse41 | vamrnb::kCpuAvx2, 1},
+#if defined(__aarch64__)
+    {"neon+a64", vamrnb::kCpuNeon, 0},   // the A64 forms replace some NEON ones
+#else
     {"neon", vamrnb::kCpuNeon, 0},
+#endif
 };
 
 }  // namespace

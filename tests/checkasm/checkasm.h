@@ -1,9 +1,9 @@
 // checkasm: every vector version of every kernel against its portable
 // version.  For each kernel and each level the processor offers (x86:
-// SSE4.1, then AVX2 on top; ARM: NEON), the version that level newly
-// installs is called on the same random and rail inputs as the portable
-// one; outputs are compared including guard bands before and after every
-// output buffer, so a version that writes past its buffer fails even when
+// SSE4.1, then AVX2 on top; ARM: NEON, with its A64 forms on AArch64), the
+// version that level newly installs is called on the same random and rail
+// inputs as the portable one; outputs are compared including guard bands
+// before and after every output buffer, so a version that writes past its buffer fails even when
 // the samples it should write are right.
 //
 //   vamrnb_checkasm [--seed=N] [--function=GLOB] [--bench] [--runs=N]

@@ -1,6 +1,7 @@
 // The ARM kernel levels: declarations of the NEON versions (32-bit ARM with
-// NEON and AArch64 alike) and the init function that installs them over the
-// portable table.  Included by dsp.cpp and the NEON kernel file.
+// NEON and AArch64 alike), of the A64 versions (AArch64 only), and the init
+// function that installs them over the portable table.  Included by dsp.cpp
+// and the ARM kernel files.
 #pragma once
 
 #include "lpc/dsp.h"
@@ -11,6 +12,9 @@
 namespace vamrnb {
 
 VAMRNB_DECL_KERNELS(neon)
+#if defined(__aarch64__)
+VAMRNB_DECL_KERNELS(a64)
+#endif
 
 inline void dsp_init_arm(DspKernels &c, uint32_t flags) {
     if (!(flags & kCpuNeon)) return;
@@ -27,6 +31,16 @@ inline void dsp_init_arm(DspKernels &c, uint32_t flags) {
     c.vq_subvec4 = vq_subvec4_neon;
     c.cor_h_x = cor_h_x_neon;
     c.norm_corr_sums = norm_corr_sums_neon;
+#if defined(__aarch64__)
+    // Every AArch64 processor has the vector unit, so the A64 forms belong
+    // to the same level.  comp_corr has none of its own: its shared helpers
+    // (simd_arm.h) already take their A64 forms there.
+    c.residu = residu_a64;
+    c.pred_lt_3or6 = pred_lt_3or6_a64;
+    c.inner_product = inner_product_a64;
+    c.convolve = convolve_a64;
+    c.cor_h_x = cor_h_x_a64;
+#endif
 }
 
 }  // namespace vamrnb

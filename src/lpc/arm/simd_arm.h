@@ -1,8 +1,8 @@
-// Helpers shared by the NEON kernels (32-bit ARM and AArch64).  NEON has the
-// codec's fixed-point steps as instructions (vqdmlal: saturating doubling
-// multiply-accumulate, vqdmulh: mult, vqrshrn: round16 and narrow), so what
-// is shared here are the reductions and the plain sums that range bounds
-// allow.
+// Helpers shared by the NEON kernels (32-bit ARM and AArch64, where they take
+// their A64 forms).  NEON has the codec's fixed-point steps as instructions
+// (vqdmlal: saturating doubling multiply-accumulate, vqdmulh: mult, vqrshrn:
+// round16 and narrow), so what is shared here are the reductions and the
+// plain sums that range bounds allow.
 #pragma once
 
 #include <arm_neon.h>
@@ -13,14 +13,22 @@ namespace vamrnb::arm {
 
 // Plain (wrapping) sum of the lanes.
 inline int32_t hsum(int32x4_t v) {
+#if defined(__aarch64__)
+    return vaddvq_s32(v);   // one across-vector add
+#else
     const int32x2_t p = vadd_s32(vget_low_s32(v), vget_high_s32(v));
     return vget_lane_s32(vpadd_s32(p, p), 0);
+#endif
 }
 
 // Exact products of eight sample pairs added into four lanes.
 inline int32x4_t mla8(int32x4_t acc, int16x8_t a, int16x8_t b) {
     acc = vmlal_s16(acc, vget_low_s16(a), vget_low_s16(b));
+#if defined(__aarch64__)
+    return vmlal_high_s16(acc, a, b);   // the high halves in place
+#else
     return vmlal_s16(acc, vget_high_s16(a), vget_high_s16(b));
+#endif
 }
 
 // 2·sum x·y in any order; only for sums known not to saturate.
