@@ -33,13 +33,11 @@ inline void dsp_init_arm(DspKernels &c, uint32_t flags) {
     c.norm_corr_sums = norm_corr_sums_neon;
 #if defined(__aarch64__)
     // Every AArch64 processor has the vector unit, so the A64 forms belong
-    // to the same level.  comp_corr has none of its own: its shared helpers
-    // (simd_arm.h) already take their A64 forms there.
+    // to the same level.  The other kernels have no A64 versions of their
+    // own: their shared helpers (simd_arm.h) and a few #if blocks take the
+    // A64 forms there.
     c.residu = residu_a64;
     c.pred_lt_3or6 = pred_lt_3or6_a64;
-    c.inner_product = inner_product_a64;
-    c.convolve = convolve_a64;
-    c.cor_h_x = cor_h_x_a64;
 #endif
 }
 

@@ -13,17 +13,6 @@
 #include "lpc/tables.h"
 
 namespace vamrnb {
-namespace {
-
-// Eight exact products p[0..7]·c added to (lo, hi).
-inline void mla8_n(int32x4_t &lo, int32x4_t &hi, const Word16 *p, Word16 c) {
-    const int16x8_t v = vld1q_s16(p);
-    lo = vmlal_n_s16(lo, vget_low_s16(v), c);
-    hi = vmlal_high_n_s16(hi, v, c);
-}
-
-}  // namespace
-
 void residu_a64(const Word16 *a, const Word16 *x, Word16 *y) {
     for (int n = 0; n < L_SUBFR; n += 8) {
         int16x8_t v = vld1q_s16(x + n);
@@ -59,60 +48,6 @@ void pred_lt_3or6_a64(Word32 T0, Word32 frac, Word32 flag3, Word16 *exc) {
         }
         vst1q_s16(exc + j, vqrshrn_high_n_s32(vqrshrn_n_s32(lo, 16), hi, 16));
     }
-}
-
-// The lanes' sum and maxima leave the registers as three scalars, not as
-// stored vectors.
-Word32 inner_product_a64(const Word16 *x, const Word16 *y, Word32 n, Word32 init) {
-    if (n <= 0) return init;
-    const Word32 n8 = n & ~7;
-    uint16x8_t mx = vdupq_n_u16(0), my = vdupq_n_u16(0);
-    int32x4_t acc = vdupq_n_s32(0);
-    for (Word32 i = 0; i < n8; i += 8) {
-        const int16x8_t a = vld1q_s16(x + i), b = vld1q_s16(y + i);
-        mx = vmaxq_u16(mx, vreinterpretq_u16_s16(vabsq_s16(a)));
-        my = vmaxq_u16(my, vreinterpretq_u16_s16(vabsq_s16(b)));
-        acc = arm::mla8(acc, a, b);
-    }
-    return enc_kernel::inner_product_finish(x, y, n, n8, init, vaddlvq_s32(acc), vmaxvq_u16(mx),
-                                            vmaxvq_u16(my), inner_product_c);
-}
-
-// Eight outputs per step, as the NEON version; h is read through a copy with
-// 40 zeros in front so that terms past the causal limit vanish.  The output
-// steps run on all eight lanes: the wrapping doubling, the saturating shift
-// by 3 and the high half.
-void convolve_a64(const Word16 *x, const Word16 *h, Word16 *y) {
-    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
-        enc_kernel::convolve_sat(x, h, y);
-        return;
-    }
-    Word16 hp[2 * L_SUBFR] = {};
-    for (int i = 0; i < L_SUBFR; ++i) hp[L_SUBFR + i] = h[i];
-    for (int n = 0; n < L_SUBFR; n += 8) {
-        int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
-        for (int i = 0; i <= n + 7 && i < L_SUBFR; ++i) mla8_n(lo, hi, hp + L_SUBFR + n - i, x[i]);
-        lo = vqshlq_n_s32(vshlq_n_s32(lo, 1), 3);
-        hi = vqshlq_n_s32(vshlq_n_s32(hi, 1), 3);
-        vst1q_s16(y + n, vshrn_high_n_s32(vshrn_n_s32(lo, 16), hi, 16));
-    }
-}
-
-void cor_h_x_a64(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf) {
-    Word32 y[L_SUBFR];
-    if (!enc_kernel::no_saturation(enc_kernel::sum_sq(x, L_SUBFR), enc_kernel::sum_sq(h, L_SUBFR))) {
-        enc_kernel::cor_h_x_sat(h, x, y);
-    } else {
-        Word16 q[2 * L_SUBFR + 8];
-        enc_kernel::cor_h_x_reverse(h, q, 2 * L_SUBFR + 8);
-        for (int i = 0; i < L_SUBFR; i += 8) {
-            int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
-            for (int j = i; j < L_SUBFR; ++j) mla8_n(lo, hi, q + 39 + i - j, x[j]);
-            vst1q_s32(y + i, vshlq_n_s32(lo, 1));
-            vst1q_s32(y + i + 4, vshlq_n_s32(hi, 1));
-        }
-    }
-    enc_kernel::cor_h_x_scale(y, dn, sf);
 }
 
 }  // namespace vamrnb

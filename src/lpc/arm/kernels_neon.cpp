@@ -119,12 +119,18 @@ Word32 inner_product_neon(const Word16 *x, const Word16 *y, Word32 n, Word32 ini
         my = vmaxq_u16(my, vreinterpretq_u16_s16(vabsq_s16(b)));
         acc = mla8(acc, a, b);
     }
+#if defined(__aarch64__)
+    // The lanes' sum and maxima leave the registers as three scalars.
+    return enc_kernel::inner_product_finish(x, y, n, n8, init, vaddlvq_s32(acc), vmaxvq_u16(mx),
+                                            vmaxvq_u16(my), inner_product_c);
+#else
     uint16_t ax[8], ay[8];
     int32_t sums[4];
     vst1q_u16(ax, mx);
     vst1q_u16(ay, my);
     vst1q_s32(sums, acc);
     return enc_kernel::inner_product_finish(x, y, n, n8, init, ax, ay, sums, inner_product_c);
+#endif
 }
 
 // Normalised-correlation lag loop with the 40-sample filtered excitation in
@@ -195,14 +201,19 @@ void convolve_neon(const Word16 *x, const Word16 *h, Word16 *y) {
     for (int i = 0; i < L_SUBFR; ++i) hp[L_SUBFR + i] = h[i];
     for (int n = 0; n < L_SUBFR; n += 8) {
         int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
-        for (int i = 0; i <= n + 7 && i < L_SUBFR; ++i) {
-            lo = vmlal_n_s16(lo, vld1_s16(hp + L_SUBFR + n - i), x[i]);
-            hi = vmlal_n_s16(hi, vld1_s16(hp + L_SUBFR + n + 4 - i), x[i]);
-        }
+        for (int i = 0; i <= n + 7 && i < L_SUBFR; ++i) mla8_n(lo, hi, hp + L_SUBFR + n - i, x[i]);
+#if defined(__aarch64__)
+        // The output steps on all eight lanes: the wrapping doubling, the
+        // saturating shift by 3 and the high half.
+        lo = vqshlq_n_s32(vshlq_n_s32(lo, 1), 3);
+        hi = vqshlq_n_s32(vshlq_n_s32(hi, 1), 3);
+        vst1q_s16(y + n, vshrn_high_n_s32(vshrn_n_s32(lo, 16), hi, 16));
+#else
         Word32 s[8];
         vst1q_s32(s, lo);
         vst1q_s32(s + 4, hi);
         for (int k = 0; k < 8; ++k) y[n + k] = enc_kernel::convolve_out(wrap_shl(s[k], 1));
+#endif
     }
 }
 
@@ -215,10 +226,7 @@ void cor_h_x_neon(const Word16 *h, const Word16 *x, Word16 *dn, Word32 sf) {
         enc_kernel::cor_h_x_reverse(h, q, 2 * L_SUBFR + 8);
         for (int i = 0; i < L_SUBFR; i += 8) {
             int32x4_t lo = vdupq_n_s32(0), hi = vdupq_n_s32(0);
-            for (int j = i; j < L_SUBFR; ++j) {
-                lo = vmlal_n_s16(lo, vld1_s16(q + 39 + i - j), x[j]);
-                hi = vmlal_n_s16(hi, vld1_s16(q + 43 + i - j), x[j]);
-            }
+            for (int j = i; j < L_SUBFR; ++j) mla8_n(lo, hi, q + 39 + i - j, x[j]);
             vst1q_s32(y + i, vshlq_n_s32(lo, 1));
             vst1q_s32(y + i + 4, vshlq_n_s32(hi, 1));
         }

@@ -31,6 +31,18 @@ inline int32x4_t mla8(int32x4_t acc, int16x8_t a, int16x8_t b) {
 #endif
 }
 
+// Eight exact products p[0..7]·c added to (lo, hi).
+inline void mla8_n(int32x4_t &lo, int32x4_t &hi, const Word16 *p, Word16 c) {
+#if defined(__aarch64__)
+    const int16x8_t v = vld1q_s16(p);   // one load, the high half in place
+    lo = vmlal_n_s16(lo, vget_low_s16(v), c);
+    hi = vmlal_high_n_s16(hi, v, c);
+#else
+    lo = vmlal_n_s16(lo, vld1_s16(p), c);
+    hi = vmlal_n_s16(hi, vld1_s16(p + 4), c);
+#endif
+}
+
 // 2·sum x·y in any order; only for sums known not to saturate.
 inline Word32 dot_exact(const Word16 *x, const Word16 *y, Word32 n) {
     int32x4_t acc = vdupq_n_s32(0);
