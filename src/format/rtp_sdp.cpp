@@ -148,6 +148,7 @@ VAMRNB_API int32_t vamrnb_rtp_fmtp_format(const vamrnb_rtp_params *params, char 
 
     // Long enough for every parameter at its widest.
     char buf[256];
+    buf[0] = '\0';  // all parameters at their defaults: an empty line
     size_t n = 0;
     const auto add = [&](const char *name, int32_t value) {
         n += static_cast<size_t>(std::snprintf(buf + n, sizeof buf - n, "%s%s=%d",

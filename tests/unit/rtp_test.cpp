@@ -322,6 +322,17 @@ TEST(Rtp, SdpParameters) {
     EXPECT_EQ(p.crc, 1);
     EXPECT_EQ(p.max_red, 0);
     EXPECT_EQ(p.mode_change_period, 1);
+    {
+        // Every parameter at its default formats as an empty line.
+        vamrnb_rtp_params d;
+        vamrnb_rtp_params_default(&d);
+        char empty[8];
+        std::memset(empty, 'x', sizeof empty);
+        size_t len = 99;
+        ASSERT_EQ(vamrnb_rtp_fmtp_format(&d, empty, sizeof empty, &len), AMRNB_OK);
+        EXPECT_EQ(len, 0u);
+        EXPECT_EQ(empty[0], '\0');
+    }
     char text[128];
     size_t len = 0;
     ASSERT_EQ(vamrnb_rtp_fmtp_format(&p, text, sizeof text, &len), AMRNB_OK);
